@@ -1,0 +1,347 @@
+// The index walk: finding the current adapter in its ring of 120 slots,
+// bringing its copies up to date with the disk, and reading list entries,
+// data block headers, index entries and frame payloads with their bounds and
+// XOR-sum checks. Nothing here writes to the disk: the refresh changes the
+// adapter in memory only.
+#include <algorithm>
+#include <cinttypes>
+#include <climits>
+#include <cstdio>
+
+#include "dvrfs/dvr_disk_reader.h"
+#include "dvrfs/error_places.h"
+#include "dvrfs/record_math.h"
+
+using namespace dvrfs;
+
+int DvrDiskReader::BlockOpe(wxFile* file, char op, void* buffer, wxInt64 position, int count)
+{
+    switch (op) {
+    case 2:
+        return SearchAdapter(file);
+    case 5:
+        return DumpAdapter();
+    case 33:
+        return ReadListEntries(file, static_cast<std::int32_t>(position), count, Bytes(buffer));
+    case 35:
+        return RefreshAdapter(file, position, count);
+    case 65:
+        return ReadBlockHeaders(file, position, count, Bytes(buffer));
+    default:
+        return 1;
+    }
+}
+
+int DvrDiskReader::DataBlockOpe(wxFile* file, char op, void* buffer, wxInt64 block, int a, int b)
+{
+    switch (op) {
+    case 'Q':
+        return ReadIndexEntries(file, block, a, b, Bytes(buffer));
+    case 'a':
+        return ReadPayload(file, block, a, b, Bytes(buffer));
+    default:
+        return 1;
+    }
+}
+
+bool DvrDiskReader::RecordSumMatches(const char* record, int size)
+{
+    const int sum = Checksum(const_cast<char*>(record), size);
+    return static_cast<std::uint8_t>(sum) == m_volume->adapter->RecordSum;
+}
+
+bool DvrDiskReader::AdapterSlotIsValid(const _HisiAdapter_t& slot, int number)
+{
+    return slot.Idx == number &&
+           Checksum(const_cast<char*>(reinterpret_cast<const char*>(&slot)), kAdapterSize) == 0;
+}
+
+// The list ring, its mirror and the data ring must lie inside the block space,
+// and within the sizes the reader accepts, before anything walks them.
+bool DvrDiskReader::AdapterRingsFit(const _HisiAdapter_t& adapter) const
+{
+    if (adapter.ListMax > kMaxListMax || adapter.DataBlockMax > kMaxDataBlockMax)
+        return false;
+    const _H264SuperBlock_t& super = m_volume->superBlock;
+    const wxInt64 space = static_cast<wxInt64>(super.BlockCount) * super.BlockSize;
+    auto fits = [space](wxUint64 offset, wxInt64 count, wxInt64 stride) {
+        if (count <= 0)
+            return true;  // an empty ring occupies nothing
+        if (space <= 0 || offset > static_cast<wxUint64>(space))
+            return false;
+        return static_cast<wxUint64>(count * stride) <= static_cast<wxUint64>(space) - offset;
+    };
+    return fits(adapter.ListOffset, adapter.ListMax, kListEntrySize) &&
+           fits(adapter.ListOffsetBackup, adapter.ListMax, kListEntrySize) &&
+           fits(adapter.DataBlockOffset, adapter.DataBlockMax, kDataBlockSize);
+}
+
+// The current adapter is the end of the first run of valid slots, scanning
+// the ring twice from slot 0 so that a run across slot 119 is seen whole.
+int DvrDiskReader::SearchAdapter(wxFile* file)
+{
+    if (!HasVolume())
+        return -1;
+    auto candidate = std::make_unique<_HisiAdapter_t>();
+    const wxInt64 slotStride = m_volume->superBlock.BlockSize;
+
+    int chosen = -1;
+    for (int i = 0; i < 2 * kAdapterSlotCount; ++i) {
+        const int slot = i % kAdapterSlotCount;
+        if (BlockRead(file, slot * slotStride, Bytes(candidate.get()), kAdapterSize) < 0)
+            return -1;
+        if (AdapterSlotIsValid(*candidate, slot))
+            chosen = slot;
+        else if (chosen != -1)
+            break;
+    }
+
+    // With no valid slot the position is negative and the read refuses it.
+    if (BlockRead(file, chosen * slotStride, Bytes(candidate.get()), kAdapterSize) < 0)
+        return -1;
+    if (!AdapterSlotIsValid(*candidate, chosen)) {
+        SetError(kErrAdapter, kAtAdapter);
+        return -1;
+    }
+    if (!AdapterRingsFit(*candidate)) {
+        SetError(kErrAdapterRings, kAtAdapterRings);
+        return -1;
+    }
+    m_volume->adapter = std::move(candidate);
+
+    const _HisiAdapter_t& adapter = *m_volume->adapter;
+    if (adapter.LastList.Idx < 0)
+        return 1;  // the volume holds no recording
+    const wxInt64 first = adapter.FirstList.Idx;
+    wxInt64 last = adapter.LastList.Idx;
+    if (last < first)
+        last += adapter.ListMax;
+    const wxInt64 span = last - first + 1;
+    if (span > INT_MAX) {
+        SetError(kErrListSpan, kAtListSpan);
+        return -1;
+    }
+    return RefreshAdapter(file, first, static_cast<int>(span)) < 0 ? -1 : 1;
+}
+
+// Rebuilds the adapter's summary from list entries first .. first + count - 1
+// (around the ring): oldest and newest readable entry, earliest start, latest
+// end, then the newest readable data block header and index entry.
+int DvrDiskReader::RefreshAdapter(wxFile* file, wxInt64 first, int count)
+{
+    if (!HasAdapter())
+        return -1;
+    _HisiAdapter_t& adapter = *m_volume->adapter;
+    // A span longer than the ring would visit entries again and again.
+    if (adapter.ListMax > 0 && count > adapter.ListMax) {
+        SetError(kErrListSpan, kAtListSpan);
+        return -1;
+    }
+    _HisiList_t entry{};
+    if (ReadListEntries(file, first, 1, Bytes(&entry)) < 0)
+        return -1;
+
+    wxInt64 oldest = -1;
+    wxInt64 newest = -1;
+    for (int k = 0; k < count; ++k) {
+        const wxInt64 position = ReduceInRing(first + k, adapter.ListMax);
+        if (ReadListEntries(file, position, 1, Bytes(&entry)) < 0)
+            continue;
+        if (oldest == -1) {
+            oldest = position;
+            adapter.StartTime = entry.StartTime;
+            adapter.EndTime = entry.EndTime;
+        }
+        newest = position;
+        adapter.StartTime = std::min(adapter.StartTime, entry.StartTime);
+        adapter.EndTime = std::max(adapter.EndTime, entry.EndTime);
+    }
+    adapter.FirstList.Idx = static_cast<std::int32_t>(oldest);
+    adapter.LastList.Idx = static_cast<std::int32_t>(newest);
+    if (ReadListEntries(file, adapter.FirstList.Idx, 1, Bytes(&adapter.FirstList)) < 0 ||
+        ReadListEntries(file, adapter.LastList.Idx, 1, Bytes(&adapter.LastList)) < 0)
+        return -1;
+
+    if (RefreshNewestBlockHeader(file) < 0)
+        return -1;
+    if (adapter.LastFrame.FrameInfo < 0)
+        return 1;  // the adapter records no frame
+    return RefreshNewestFrame(file);
+}
+
+// Reads the header of the newest recording's last block; when that is
+// damaged, walks back through the recording for the newest readable header.
+int DvrDiskReader::RefreshNewestBlockHeader(wxFile* file)
+{
+    _HisiAdapter_t& adapter = *m_volume->adapter;
+    char* header = Bytes(&adapter.CurBlockHeader);
+    if (ReadBlockHeaders(file, adapter.LastList.EndBlock, 1, header) >= 0)
+        return 1;
+
+    const wxInt64 lowest = adapter.LastList.StartBlock;
+    wxInt64 candidate = adapter.LastList.EndBlock;
+    if (lowest > candidate)
+        candidate += adapter.DataBlockMax;
+    if (lowest > candidate)
+        return -1;
+    // After one whole turn of the ring every block has been tried once; the
+    // candidates beyond it would only repeat failed reads.
+    const wxInt64 tries = std::min<wxInt64>(candidate - lowest + 1, std::max(adapter.DataBlockMax, 1));
+    for (wxInt64 t = 0; t < tries; ++t) {
+        const wxInt64 block = ReduceInRing(candidate - t, adapter.DataBlockMax);
+        if (ReadBlockHeaders(file, block, 1, header) >= 0) {
+            adapter.LastList.EndBlock = static_cast<std::int32_t>(block);
+            return 1;
+        }
+    }
+    return -1;
+}
+
+// Reads the newest index entry of the newest block; when that is damaged,
+// the newest readable one before it, and shortens the block's frame count.
+int DvrDiskReader::RefreshNewestFrame(wxFile* file)
+{
+    _HisiAdapter_t& adapter = *m_volume->adapter;
+    char* frame = Bytes(&adapter.LastFrame);
+    const wxInt64 block = adapter.CurBlockHeader.BlockIdx;
+    const wxInt64 frameCount = adapter.CurBlockHeader.FrameCount;
+    if (ReadIndexEntries(file, block, frameCount - 1, 1, frame) >= 0)
+        return 1;
+    // Entries past the last one that fits are refused without a read.
+    for (wxInt64 k = std::min<wxInt64>(frameCount - 2, kLastIndexEntry); k >= 0; --k) {
+        if (ReadIndexEntries(file, block, k, 1, frame) >= 0) {
+            adapter.CurBlockHeader.FrameCount = static_cast<std::int32_t>(k + 1);
+            return 1;
+        }
+    }
+    return -1;
+}
+
+int DvrDiskReader::ReadListEntries(wxFile* file, wxInt64 index, int count, char* buffer)
+{
+    if (!HasAdapter())
+        return -1;
+    const _HisiAdapter_t& adapter = *m_volume->adapter;
+    if (index < 0) {
+        SetError(kErrListNegative, kAtListNegative);
+        return -1;
+    }
+    if (index + count > adapter.ListMax) {
+        SetError(kErrListBeyond, kAtListBeyond);
+        return -1;
+    }
+    if (BlockRead(file, RecordPosition(adapter.ListOffset, index, kListEntrySize, 0), buffer,
+                  RecordBytes(count, kListEntrySize)) < 0)
+        return -1;
+    for (int j = 0; j < count; ++j) {
+        char* entry = buffer + static_cast<wxInt64>(j) * kListEntrySize;
+        if (RecordSumMatches(entry, kListEntrySize))
+            continue;
+        // Damaged in the ring: take the mirror copy; code 50 stays either way.
+        SetError(kErrListEntry, kAtListEntry);
+        if (BlockRead(file, RecordPosition(adapter.ListOffsetBackup, index + j, kListEntrySize, 0), entry,
+                      kListEntrySize) < 0)
+            return -1;
+        if (!RecordSumMatches(entry, kListEntrySize))
+            return -1;
+    }
+    return 1;
+}
+
+int DvrDiskReader::ReadBlockHeaders(wxFile* file, wxInt64 block, int count, char* buffer)
+{
+    if (!HasAdapter())
+        return -1;
+    const _HisiAdapter_t& adapter = *m_volume->adapter;
+    if (block < 0) {
+        SetError(kErrBlockNegative, kAtBlockNegative);
+        return -1;
+    }
+    wxInt64 end = 0;
+    if (__builtin_add_overflow(block, static_cast<wxInt64>(count), &end) || end > adapter.DataBlockMax) {
+        SetError(kErrBlockBeyond, kAtBlockBeyond);
+        return -1;
+    }
+    for (int j = 0; j < count; ++j) {
+        char* header = buffer + static_cast<wxInt64>(j) * kBlockHeaderSize;
+        if (BlockRead(file, RecordPosition(adapter.DataBlockOffset, block + j, kDataBlockSize, 0), header,
+                      kBlockHeaderSize) < 0)
+            return -1;
+        if (!RecordSumMatches(header, kBlockHeaderSize)) {
+            SetError(kErrBlockHeader, kAtBlockHeader);
+            return -1;
+        }
+    }
+    return 1;
+}
+
+// Index entries grow down from the end of the block: entries first ..
+// first + count - 1 are one range in which the last of them comes first.
+int DvrDiskReader::ReadIndexEntries(wxFile* file, wxInt64 block, wxInt64 first, wxInt64 count,
+                                    char* buffer)
+{
+    if (!HasAdapter())
+        return -1;
+    const _HisiAdapter_t& adapter = *m_volume->adapter;
+    if (first < 0) {
+        SetError(kErrIndexNegative, kAtIndexNegative);
+        return -1;
+    }
+    if (first > kLastIndexEntry) {
+        SetError(kErrIndexBeyond, kAtIndexBeyond);
+        return -1;
+    }
+    wxInt64 nextBlock = 0;
+    const wxInt64 position =
+        __builtin_add_overflow(block, 1, &nextBlock)
+            ? -1
+            : RecordPosition(adapter.DataBlockOffset, nextBlock, kDataBlockSize, -(first + count) * kIndexEntrySize);
+    if (BlockRead(file, position, buffer, RecordBytes(count, kIndexEntrySize)) < 0)
+        return -1;
+    for (wxInt64 j = 0; j < count; ++j) {
+        if (!RecordSumMatches(buffer + j * kIndexEntrySize, kIndexEntrySize)) {
+            SetError(kErrIndexEntry, kAtIndexEntry);
+            return -1;
+        }
+    }
+    return 1;
+}
+
+int DvrDiskReader::ReadPayload(wxFile* file, wxInt64 block, int offset, int length, char* buffer)
+{
+    if (!HasAdapter())
+        return -1;
+    const _HisiAdapter_t& adapter = *m_volume->adapter;
+    if (offset < 0) {
+        SetError(kErrPayloadNegative, kAtPayloadNegative);
+        return -1;
+    }
+    // Taken as unsigned 32 bits, so that a negative length is refused too.
+    if (static_cast<std::uint32_t>(static_cast<wxInt64>(offset) + length) > kPayloadAreaSize) {
+        SetError(kErrPayloadBeyond, kAtPayloadBeyond);
+        return -1;
+    }
+    return BlockRead(file, RecordPosition(adapter.DataBlockOffset, block, kDataBlockSize, kBlockHeaderSize + offset),
+                     buffer, length);
+}
+
+int DvrDiskReader::DumpAdapter()
+{
+    if (!HasAdapter())
+        return -1;
+    const _HisiAdapter_t& a = *m_volume->adapter;
+    std::printf("\tAdapter: Version=%d, TimeStamp=%d, Idx=%d, Magic=0x%.2X\n", a.Version, a.TimeStamp, a.Idx,
+                a.Magic);
+    std::printf("\tList: Offset=%" PRId64 ", OffsetBackup=%" PRId64 ", Max=%d\n",
+                static_cast<std::int64_t>(a.ListOffset), static_cast<std::int64_t>(a.ListOffsetBackup), a.ListMax);
+    std::printf("\tDataBlock: Offset=%" PRId64 ", Max=%" PRId64 "\n", static_cast<std::int64_t>(a.DataBlockOffset),
+                static_cast<std::int64_t>(a.DataBlockMax));
+    auto hour = [](std::uint32_t t) { return static_cast<int>(t % 86400 / 3600); };
+    auto minute = [](std::uint32_t t) { return static_cast<int>(t % 3600 / 60); };
+    auto second = [](std::uint32_t t) { return static_cast<int>(t % 60); };
+    std::printf("\tStartTime=%d:%d:%d(%d), EndTime=%d:%d:%d(%d)\n", hour(a.StartTime), minute(a.StartTime),
+                second(a.StartTime), static_cast<int>(a.StartTime), hour(a.EndTime), minute(a.EndTime),
+                second(a.EndTime), static_cast<int>(a.EndTime));
+    std::fflush(stdout);
+    return 1;
+}

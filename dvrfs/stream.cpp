@@ -1,0 +1,130 @@
+// Stream extraction: the recorded stream read back frame by frame, with a
+// cursor (m_streamBlock, m_streamFrame) that moves forward or backward through
+// the data ring, or as a run of consecutive frames of one block.
+#include <algorithm>
+#include <climits>
+
+#include "dvrfs/dvr_disk_reader.h"
+#include "dvrfs/error_places.h"
+#include "dvrfs/record_math.h"
+
+using namespace dvrfs;
+
+namespace {
+
+// A walk that passes over this many blocks without finding a frame has gone
+// round the ring at least once with nothing to deliver: it would never end.
+wxInt64 MaxEmptyBlocks(wxInt64 ringSize)
+{
+    return 2 * std::max<wxInt64>(ringSize, 0) + 2;
+}
+
+}  // namespace
+
+int DvrDiskReader::DeliverFrame(wxFile* file, const _HisiBlockHeader_t& block, unsigned char* payload,
+                                _HisiHeader_t* header)
+{
+    if (ReadIndexEntries(file, block.BlockIdx, m_streamFrame, 1, Bytes(header)) < 0)
+        return -1;
+    if (ReadPayload(file, block.BlockIdx, header->DataOffset, header->DataSize, Bytes(payload)) < 0)
+        return -1;
+    if (header->DataSize < 0)
+        return -1;
+    return header->DataSize;
+}
+
+int DvrDiskReader::get_stream(wxFile* file, unsigned char* payload, _HisiHeader_t* header, _HisiList_t first,
+                              _HisiList_t last, int direction)
+{
+    if (!HasAdapter())
+        return -1;
+    const _HisiAdapter_t& adapter = *m_volume->adapter;
+    const wxInt64 ringSize = adapter.DataBlockMax;
+    _HisiBlockHeader_t block{};
+
+    if (direction != 0) {
+        // The range runs to the last recording's end, across the end of the
+        // ring when it has wrapped; past it play goes on from the oldest one.
+        wxInt64 limit = last.EndBlock;
+        if (first.StartBlock > last.EndBlock)
+            limit += ringSize;
+        for (wxInt64 passed = 0;; ++passed) {
+            if (ReadBlockHeaders(file, ReduceInRing(m_streamBlock, ringSize), 1, Bytes(&block)) < 0)
+                return -1;
+            if (m_streamFrame < block.FrameCount) {
+                const int size = DeliverFrame(file, block, payload, header);
+                if (size < 0)
+                    return -1;
+                ++m_streamFrame;
+                return size;
+            }
+            if (passed == MaxEmptyBlocks(ringSize)) {
+                SetError(kErrNoFrame, kAtNoFrame);
+                return -1;
+            }
+            if (m_streamBlock < INT64_MAX)
+                ++m_streamBlock;
+            if (m_streamBlock > limit) {
+                _HisiList_t oldest{};
+                if (ReadListEntries(file, ReduceInRing(adapter.FirstList.Idx, adapter.ListMax), 1, Bytes(&oldest)) < 0)
+                    return -1;
+                m_streamBlock = oldest.StartBlock;
+            }
+            m_streamFrame = 0;
+        }
+    }
+
+    // Backward: past the start of the oldest recording, play goes on from the
+    // end of the newest one.
+    _HisiList_t oldest{};
+    if (ReadListEntries(m_diskFile, ReduceInRing(adapter.FirstList.Idx, adapter.ListMax), 1, Bytes(&oldest)) < 0)
+        return -1;
+    const wxInt64 limit = oldest.StartBlock;
+    for (wxInt64 passed = 0;; ++passed) {
+        if (ReadBlockHeaders(file, ReduceInRing(m_streamBlock, ringSize), 1, Bytes(&block)) < 0)
+            return -1;
+        if (m_streamFrame >= 0) {
+            const int size = DeliverFrame(file, block, payload, header);
+            if (size < 0)
+                return -1;
+            --m_streamFrame;
+            return size;
+        }
+        if (passed == MaxEmptyBlocks(ringSize)) {
+            SetError(kErrNoFrame, kAtNoFrame);
+            return -1;
+        }
+        --m_streamBlock;  // not negative here: the header read above refuses negative blocks
+        if (m_streamBlock < limit) {
+            _HisiList_t newest{};
+            if (ReadListEntries(file, ReduceInRing(adapter.LastList.Idx, adapter.ListMax), 1, Bytes(&newest)) < 0)
+                return -1;
+            m_streamBlock = newest.EndBlock;
+        }
+        if (ReadBlockHeaders(file, ReduceInRing(m_streamBlock, ringSize), 1, Bytes(&block)) < 0)
+            return -1;
+        m_streamFrame = block.FrameCount > INT32_MIN ? block.FrameCount - 1 : -1;
+    }
+}
+
+int DvrDiskReader::StreamRead(wxFile* file, char flags, wxInt64 block, int first, int count,
+                              _HisiHeader_t* entries, unsigned char* payload)
+{
+    if (count < 1 || !entries)
+        return -1;
+    if ((flags & 1) && ReadIndexEntries(file, block, first, count, Bytes(entries)) < 0)
+        return -1;
+    // From the start of the oldest frame of the run (last in the array) to
+    // the end of the newest (first in the array).
+    const _HisiHeader_t& newest = entries[0];
+    const _HisiHeader_t& oldest = entries[count - 1];
+    const wxInt64 length = static_cast<wxInt64>(newest.DataOffset) + newest.DataSize - oldest.DataOffset;
+    if (length > INT_MAX || length < INT_MIN) {
+        SetError(kErrPayloadBeyond, kAtPayloadBeyond);
+        return -1;
+    }
+    if ((flags & 2) &&
+        ReadPayload(file, block, oldest.DataOffset, static_cast<int>(length), Bytes(payload)) < 0)
+        return -1;
+    return static_cast<int>(length);
+}
