@@ -1,0 +1,53 @@
+// A test that writes disk images with the image writer and reads them with
+// the reader. After every test it checks that each image the reader opened
+// was opened read-only and still holds exactly the bytes it was written with.
+#ifndef TESTS_SUPPORT_DISK_FIXTURE_H
+#define TESTS_SUPPORT_DISK_FIXTURE_H
+
+#include <gtest/gtest.h>
+
+#include <cstdint>
+#include <map>
+#include <string>
+
+#include "dvrfs/dvr_disk_reader.h"
+#include "tools/dvrimage/dvr_image.h"
+
+// A fingerprint of a sparse file: its size and a hash of its data extents.
+std::string FileFingerprint(const std::string& path);
+
+// Rewrites bytes of both superblock copies and seals their header sums
+// again, for values the writer cannot lay out (a table too large to write,
+// a block space beyond any file).
+void PatchSuperBlocks(dvrimage::DiskImage& image, const std::string& path, std::size_t at, const void* bytes,
+                      std::size_t size);
+
+// A small, valid geometry: 4096-byte blocks, 16 list entries, 8 data blocks.
+dvrimage::Layout SmallLayout();
+
+class DiskTest : public ::testing::Test {
+protected:
+    void SetUp() override;
+    void TearDown() override;
+
+    // Writes the image into this test's folder and remembers its fingerprint
+    // (call again after damaging it).
+    std::string WriteImage(dvrimage::DiskImage& image, const std::string& name = "disk.img");
+    void Refingerprint(const std::string& path);
+
+    // Opens the image with reader_ and runs what a catalogue build runs
+    // first: configured-recorder check and adapter search.
+    int Open(const std::string& path);
+    int OpenAndSearch(const std::string& path);
+
+    const _HisiAdapter_t& Adapter() const { return *reader_.m_volume->adapter; }
+    std::string ErrorText() const { return reader_.m_errorText; }
+
+    std::string dir_;
+    DvrDiskReader reader_;
+
+private:
+    std::map<std::string, std::string> fingerprints_;
+};
+
+#endif

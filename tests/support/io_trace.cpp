@@ -1,0 +1,153 @@
+#include "tests/support/io_trace.h"
+
+#include <dlfcn.h>
+#include <errno.h>
+#include <fcntl.h>
+#include <unistd.h>
+
+#include <cstdarg>
+#include <map>
+#include <mutex>
+
+namespace {
+
+struct Fault {
+    std::string path;
+    std::int64_t offset;
+    std::int64_t length;   // failing range; 0 for a corruption
+    int fromRead;          // corruption: the first read that changes the byte
+    int readsSeen = 0;
+};
+
+struct State {
+    std::mutex mutex;
+    std::map<int, std::string> pathOfFd;
+    std::vector<iotrace::OpenCall> opens;
+    std::map<std::string, std::vector<iotrace::ReadCall>> reads;
+    std::vector<Fault> failures;
+    std::vector<Fault> corruptions;
+};
+
+State& TheState()
+{
+    static State* state = new State;  // outlives every static destructor that might read
+    return *state;
+}
+
+template <typename Fn>
+Fn Real(const char* name)
+{
+    return reinterpret_cast<Fn>(dlsym(RTLD_NEXT, name));
+}
+
+}  // namespace
+
+extern "C" int open64(const char* path, int flags, ...)
+{
+    mode_t mode = 0;
+    if (flags & (O_CREAT | O_TMPFILE)) {
+        va_list args;
+        va_start(args, flags);
+        mode = static_cast<mode_t>(va_arg(args, int));
+        va_end(args);
+    }
+    static auto real = Real<int (*)(const char*, int, ...)>("open64");
+    const int fd = real(path, flags, mode);
+    if (fd >= 0) {
+        State& s = TheState();
+        std::lock_guard<std::mutex> lock(s.mutex);
+        s.pathOfFd[fd] = path;
+        s.opens.push_back({path, flags});
+    }
+    return fd;
+}
+
+extern "C" int close(int fd)
+{
+    static auto real = Real<int (*)(int)>("close");
+    {
+        State& s = TheState();
+        std::lock_guard<std::mutex> lock(s.mutex);
+        s.pathOfFd.erase(fd);
+    }
+    return real(fd);
+}
+
+extern "C" ssize_t read(int fd, void* buffer, size_t count)
+{
+    static auto real = Real<ssize_t (*)(int, void*, size_t)>("read");
+    State& s = TheState();
+    std::string path;
+    {
+        std::lock_guard<std::mutex> lock(s.mutex);
+        auto it = s.pathOfFd.find(fd);
+        if (it == s.pathOfFd.end())
+            return real(fd, buffer, count);
+        path = it->second;
+    }
+    const std::int64_t offset = lseek64(fd, 0, SEEK_CUR);
+    std::unique_lock<std::mutex> lock(s.mutex);
+    s.reads[path].push_back({offset, count});
+    for (const Fault& f : s.failures) {
+        if (f.path == path && offset < f.offset + f.length && f.offset < offset + static_cast<std::int64_t>(count)) {
+            errno = EIO;
+            return -1;
+        }
+    }
+    lock.unlock();
+    const ssize_t got = real(fd, buffer, count);
+    lock.lock();
+    for (Fault& f : s.corruptions) {
+        if (f.path != path || f.offset < offset || f.offset >= offset + got)
+            continue;
+        if (++f.readsSeen >= f.fromRead)
+            static_cast<unsigned char*>(buffer)[f.offset - offset] ^= 0x01;
+    }
+    return got;
+}
+
+namespace iotrace {
+
+void Reset()
+{
+    State& s = TheState();
+    std::lock_guard<std::mutex> lock(s.mutex);
+    s.opens.clear();
+    s.reads.clear();
+    s.failures.clear();
+    s.corruptions.clear();
+}
+
+std::vector<OpenCall> Opens(const std::string& path)
+{
+    State& s = TheState();
+    std::lock_guard<std::mutex> lock(s.mutex);
+    std::vector<OpenCall> result;
+    for (const OpenCall& call : s.opens)
+        if (call.path == path)
+            result.push_back(call);
+    return result;
+}
+
+std::vector<ReadCall> Reads(const std::string& path)
+{
+    State& s = TheState();
+    std::lock_guard<std::mutex> lock(s.mutex);
+    return s.reads[path];
+}
+
+void FailReads(const std::string& path, std::int64_t offset, std::int64_t length)
+{
+    State& s = TheState();
+    std::lock_guard<std::mutex> lock(s.mutex);
+    s.failures.push_back({path, offset, length, 0});
+}
+
+void CorruptReads(const std::string& path, std::int64_t offset, int fromRead)
+{
+    State& s = TheState();
+    std::lock_guard<std::mutex> lock(s.mutex);
+    s.corruptions.push_back({path, offset, 0, fromRead});
+}
+
+}  // namespace iotrace

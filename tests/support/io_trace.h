@@ -1,0 +1,41 @@
+// Watches what the reader asks of the operating system: every open of a
+// file and every read from it, with the file offset the read started at. It
+// interposes open64 and read for the whole test binary, so it sees the
+// reader's real system calls through wxFile; it can also make chosen reads
+// fail or deliver a changed byte, the way a failing disk would.
+#ifndef TESTS_SUPPORT_IO_TRACE_H
+#define TESTS_SUPPORT_IO_TRACE_H
+
+#include <cstddef>
+#include <cstdint>
+#include <string>
+#include <vector>
+
+namespace iotrace {
+
+struct OpenCall {
+    std::string path;
+    int flags;
+};
+
+struct ReadCall {
+    std::int64_t offset;  // file position when the read started
+    std::size_t count;    // bytes asked for
+};
+
+// Forgets every call and every fault.
+void Reset();
+
+std::vector<OpenCall> Opens(const std::string& path);
+std::vector<ReadCall> Reads(const std::string& path);
+
+// Reads of `path` that overlap [offset, offset + length) fail with EIO.
+void FailReads(const std::string& path, std::int64_t offset, std::int64_t length);
+
+// From the n-th read (counting from 1) of `path` that covers byte `offset`
+// on, that byte arrives with its lowest bit flipped.
+void CorruptReads(const std::string& path, std::int64_t offset, int fromRead);
+
+}  // namespace iotrace
+
+#endif
