@@ -57,6 +57,8 @@ int DvrDiskReader::OpenDVRFS(wxString path)
         m_catalog->SpanCount = 0;
     }
 
+    // An adapter found on the device held so far says nothing of the next one.
+    m_volume->adapter.reset();
     {
         // A disk that cannot be opened is an answer, not something to show.
         wxLogNull quiet;

@@ -286,7 +286,7 @@ TEST_F(VolumeOpenTest, CheckconfigReadsTheVersionOfSlotZero)
 
     dvrimage::Layout configured = SmallLayout();
     configured.version = 7;
-    configured.adapterRunStart = 5;  // slot 0 is not a valid adapter, its version still counts
+    configured.adapterRuns = {{5, 1}};  // slot 0 is not a valid adapter, its version still counts
     DiskImage a(configured);
     dvrimage::Layout unconfigured = SmallLayout();
     unconfigured.version = 0;

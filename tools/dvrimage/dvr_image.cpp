@@ -94,7 +94,7 @@ DiskImage::DiskImage(Layout layout) : layout_(std::move(layout))
 
 void DiskImage::Resolve()
 {
-    blockSize_ = layout_.blockSize.value_or(std::int32_t{1} << layout_.blockSizeShift);
+    blockSize_ = layout_.blockSize ? *layout_.blockSize : std::int32_t{1} << layout_.blockSizeShift;
     const std::uint64_t bs = static_cast<std::uint64_t>(blockSize_);
     const std::uint64_t ringBytes = static_cast<std::uint64_t>(std::max(layout_.listMax, 1)) * 128;
     listOffset_ = layout_.listOffset ? layout_.listOffset : kAdapterSlots * bs;
@@ -118,6 +118,8 @@ std::uint64_t DiskImage::DataBlockOffset() const { return dataBlockOffset_; }
 
 std::uint64_t DiskImage::ImageSize() const
 {
+    if (layout_.imageSize)
+        return *layout_.imageSize;
     const std::uint64_t blocks = blockCount_ > 0 ? static_cast<std::uint64_t>(blockCount_) : 1;
     const std::uint64_t physicalBlocks = blocks + (blocks - 1) / kSkipRun;
     return std::max<std::uint64_t>(layout_.offsetBlockSpace + physicalBlocks * static_cast<std::uint64_t>(blockSize_),
@@ -220,13 +222,16 @@ std::vector<std::uint8_t> DiskImage::BlockTableBytes() const
     return t;
 }
 
-bool DiskImage::SlotInRun(int slot, int* positionInRun) const
+bool DiskImage::SlotInRuns(int slot, int* position) const
 {
-    const int length = std::min(layout_.adapterRunLength, kAdapterSlots);
-    for (int k = 0; k < length; ++k) {
-        if ((layout_.adapterRunStart + k) % kAdapterSlots == slot) {
-            *positionInRun = k;
-            return true;
+    int counted = 0;
+    for (const SlotRun& run : layout_.adapterRuns) {
+        const int length = std::min(run.length, kAdapterSlots);
+        for (int k = 0; k < length; ++k, ++counted) {
+            if ((run.start + k) % kAdapterSlots == slot) {
+                *position = counted;
+                return true;
+            }
         }
     }
     return false;
@@ -273,6 +278,8 @@ std::vector<std::uint8_t> DiskImage::AdapterBytes(int slot, int positionInRun) c
             endTime = std::max(endTime, r.endTime);
         }
     }
+    startTime = layout_.startTime.value_or(startTime);
+    endTime = layout_.endTime.value_or(endTime);
     if (layout_.firstListIdx)
         Put32(first, 4, static_cast<std::uint32_t>(*layout_.firstListIdx));
     if (layout_.lastListIdx)
@@ -310,7 +317,7 @@ void DiskImage::WriteAdapterRing()
     for (int slot = 0; slot < kAdapterSlots; ++slot) {
         int position = 0;
         const std::vector<std::uint8_t> bytes =
-            SlotInRun(slot, &position) ? AdapterBytes(slot, position) : UnusedSlotBytes(slot);
+            SlotInRuns(slot, &position) ? AdapterBytes(slot, position) : UnusedSlotBytes(slot);
         WriteLogical(static_cast<std::uint64_t>(slot) * static_cast<std::uint64_t>(blockSize_), bytes.data(),
                      bytes.size());
     }

@@ -42,6 +42,12 @@ struct Recording {
     std::vector<std::vector<Frame>> blocks;
 };
 
+// A run of consecutive adapter slots, wrapping past slot 119.
+struct SlotRun {
+    int start = 0;
+    int length = 1;
+};
+
 // Everything an image is made from. Fields left at their defaults give a
 // small valid disk; the superblock and adapter values are written as they
 // stand, so that tests can write values a recorder never would.
@@ -59,18 +65,22 @@ struct Layout {
     std::int32_t tableLimit = 1;             // the value at 0x0C
     std::int32_t tableLimitBound = 1;        // the value at 0x24
     std::uint32_t headerSize = 252;
+    // Size of the image file; default: up to the end of the block space. A
+    // smaller one stands for a disk that is shorter than its superblock says.
+    std::optional<std::uint64_t> imageSize;
     std::uint16_t magic = 0x1234;
 
     // Adapter ring.
-    int adapterRunStart = 0;                 // the valid run of slots, may wrap past 119
-    int adapterRunLength = 1;
+    std::vector<SlotRun> adapterRuns = {SlotRun{}};  // valid slots; the rest are left unused
     std::int32_t version = 1;                // Version: above 0 when the recorder is configured
     std::uint32_t adapterMagic = 0x48444152;
-    std::int32_t timeStampBase = 1000;       // slot k of the run carries timeStampBase + k
+    std::int32_t timeStampBase = 1000;       // the k-th valid slot carries timeStampBase + k
     std::uint8_t recordSum = 0x5A;
     bool adapterRecordsFrame = true;         // false: LastFrame says "no frame"
     std::optional<std::int32_t> firstListIdx;  // default: the first recording added
     std::optional<std::int32_t> lastListIdx;   // default: the last recording added (-1 if none)
+    std::optional<std::uint32_t> startTime;    // default: the earliest start of the recordings
+    std::optional<std::uint32_t> endTime;      // default: the latest end
 
     // Rings: sizes, and logical positions (0 places them after the adapter ring).
     std::int32_t listMax = 64;
@@ -142,7 +152,7 @@ private:
     std::vector<std::uint8_t> BlockTableBytes() const;
     std::vector<std::uint8_t> AdapterBytes(int slot, int positionInRun) const;
     std::vector<std::uint8_t> UnusedSlotBytes(int slot) const;
-    bool SlotInRun(int slot, int* positionInRun) const;
+    bool SlotInRuns(int slot, int* position) const;
     void WriteAdapterRing();
     void WriteRecording(const Recording& recording);
     std::int32_t BlockNumber(const Recording& recording, std::size_t i) const;

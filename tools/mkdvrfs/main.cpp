@@ -29,9 +29,9 @@ Geometry:
   --data-blocks N         16 MiB blocks in the data ring (default 8)
 
 Adapter:
-  --adapter-run S:L       the valid run of adapter slots: L slots from slot S,
-                          wrapping past slot 119 (default 0:1); its last slot
-                          is the current adapter
+  --adapter-run S:L       a run of valid adapter slots: L slots from slot S,
+                          wrapping past slot 119 (repeatable; default 0:1);
+                          the end of the first run is the current adapter
   --version N             Version of adapter slot 0; 0 means the recorder was
                           never configured (default 1)
   --record-sum N          XOR sum of every list entry, data block header and
@@ -221,6 +221,7 @@ int main(int argc, char** argv)
     std::vector<DamageArg> damage;
     std::string framesFile;
     std::size_t frameSize = 4096;
+    bool runsGiven = false;
     int c = 0;
     while ((c = getopt_long(argc, argv, "h", options, nullptr)) != -1) {
         switch (c) {
@@ -235,8 +236,10 @@ int main(int argc, char** argv)
             const std::vector<long long> v = Numbers(optarg, "--adapter-run");
             if (v.size() != 2)
                 UsageError("--adapter-run takes START:LENGTH");
-            layout.adapterRunStart = static_cast<int>(v[0]);
-            layout.adapterRunLength = static_cast<int>(v[1]);
+            if (!runsGiven)
+                layout.adapterRuns.clear();
+            runsGiven = true;
+            layout.adapterRuns.push_back({static_cast<int>(v[0]), static_cast<int>(v[1])});
             break;
         }
         case kVersion: layout.version = static_cast<std::int32_t>(Number(optarg, "--version")); break;
