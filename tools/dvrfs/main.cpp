@@ -45,8 +45,8 @@ const char* PlainWords(std::int32_t code)
 
 int CannotRead(const char* disk, const char* what, const DvrDiskReader& reader)
 {
-    std::fprintf(stderr, "dvrfs: %s: %s: %s (code %d: %s)\n", disk, what, PlainWords(reader.m_errorCode),
-                 reader.m_errorCode, reader.m_errorText);
+    std::fprintf(stderr, "dvrfs: %s: %s: %s (code %d%s%s)\n", disk, what, PlainWords(reader.m_errorCode),
+                 reader.m_errorCode, reader.m_errorText[0] ? ": " : "", reader.m_errorText);
     return 1;
 }
 
