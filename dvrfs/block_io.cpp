@@ -56,16 +56,12 @@ int DvrDiskReader::HddataRead(wxFile* file, char* dest, wxUint64 offset, unsigne
 
 int DvrDiskReader::BlockRead(wxFile* file, wxInt64 position, char* dest, int length)
 {
-    if (position < 0 || length < 0) {
-        SetError(kErrReadRange, kAtNegativeRead);
-        return -1;
-    }
+    if (position < 0 || length < 0)
+        return Refuse(kErrReadRange, kAtNegativeRead);
     if (length == 0)
         return 1;
-    if (!dest) {
-        SetError(kErrReadRange, kAtNegativeRead);
-        return -1;
-    }
+    if (!dest)
+        return Refuse(kErrReadRange, kAtNegativeRead);
     if (!HasVolume())
         return -1;
     if (!GeometryIsSound())

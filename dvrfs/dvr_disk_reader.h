@@ -115,6 +115,7 @@ public:
 private:
     // Error register.
     void SetError(std::int32_t code, int number);
+    int Refuse(std::int32_t code, int number);  // records the failure, returns -1
     void SetErrorText(std::int32_t code, const char* format, ...)
         __attribute__((format(printf, 3, 4)));
 

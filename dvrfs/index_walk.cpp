@@ -99,14 +99,10 @@ int DvrDiskReader::SearchAdapter(wxFile* file)
     // With no valid slot the position is negative and the read refuses it.
     if (BlockRead(file, chosen * slotStride, Bytes(candidate.get()), kAdapterSize) < 0)
         return -1;
-    if (!AdapterSlotIsValid(*candidate, chosen)) {
-        SetError(kErrAdapter, kAtAdapter);
-        return -1;
-    }
-    if (!AdapterRingsFit(*candidate)) {
-        SetError(kErrAdapterRings, kAtAdapterRings);
-        return -1;
-    }
+    if (!AdapterSlotIsValid(*candidate, chosen))
+        return Refuse(kErrAdapter, kAtAdapter);
+    if (!AdapterRingsFit(*candidate))
+        return Refuse(kErrAdapterRings, kAtAdapterRings);
     m_volume->adapter = std::move(candidate);
 
     const _HisiAdapter_t& adapter = *m_volume->adapter;
@@ -117,10 +113,8 @@ int DvrDiskReader::SearchAdapter(wxFile* file)
     if (last < first)
         last += adapter.ListMax;
     const wxInt64 span = last - first + 1;
-    if (span > INT_MAX) {
-        SetError(kErrListSpan, kAtListSpan);
-        return -1;
-    }
+    if (span > INT_MAX)
+        return Refuse(kErrListSpan, kAtListSpan);
     return RefreshAdapter(file, first, static_cast<int>(span)) < 0 ? -1 : 1;
 }
 
@@ -133,10 +127,8 @@ int DvrDiskReader::RefreshAdapter(wxFile* file, wxInt64 first, int count)
         return -1;
     _HisiAdapter_t& adapter = *m_volume->adapter;
     // A span longer than the ring would visit entries again and again.
-    if (adapter.ListMax > 0 && count > adapter.ListMax) {
-        SetError(kErrListSpan, kAtListSpan);
-        return -1;
-    }
+    if (adapter.ListMax > 0 && count > adapter.ListMax)
+        return Refuse(kErrListSpan, kAtListSpan);
     _HisiList_t entry{};
     if (ReadListEntries(file, first, 1, Bytes(&entry)) < 0)
         return -1;
@@ -222,14 +214,10 @@ int DvrDiskReader::ReadListEntries(wxFile* file, wxInt64 index, int count, char*
     if (!HasAdapter())
         return -1;
     const _HisiAdapter_t& adapter = *m_volume->adapter;
-    if (index < 0) {
-        SetError(kErrListNegative, kAtListNegative);
-        return -1;
-    }
-    if (index + count > adapter.ListMax) {
-        SetError(kErrListBeyond, kAtListBeyond);
-        return -1;
-    }
+    if (index < 0)
+        return Refuse(kErrListNegative, kAtListNegative);
+    if (index + count > adapter.ListMax)
+        return Refuse(kErrListBeyond, kAtListBeyond);
     if (BlockRead(file, RecordPosition(adapter.ListOffset, index, kListEntrySize, 0), buffer,
                   RecordBytes(count, kListEntrySize)) < 0)
         return -1;
@@ -253,24 +241,18 @@ int DvrDiskReader::ReadBlockHeaders(wxFile* file, wxInt64 block, int count, char
     if (!HasAdapter())
         return -1;
     const _HisiAdapter_t& adapter = *m_volume->adapter;
-    if (block < 0) {
-        SetError(kErrBlockNegative, kAtBlockNegative);
-        return -1;
-    }
+    if (block < 0)
+        return Refuse(kErrBlockNegative, kAtBlockNegative);
     wxInt64 end = 0;
-    if (__builtin_add_overflow(block, static_cast<wxInt64>(count), &end) || end > adapter.DataBlockMax) {
-        SetError(kErrBlockBeyond, kAtBlockBeyond);
-        return -1;
-    }
+    if (__builtin_add_overflow(block, static_cast<wxInt64>(count), &end) || end > adapter.DataBlockMax)
+        return Refuse(kErrBlockBeyond, kAtBlockBeyond);
     for (int j = 0; j < count; ++j) {
         char* header = buffer + static_cast<wxInt64>(j) * kBlockHeaderSize;
         if (BlockRead(file, RecordPosition(adapter.DataBlockOffset, block + j, kDataBlockSize, 0), header,
                       kBlockHeaderSize) < 0)
             return -1;
-        if (!RecordSumMatches(header, kBlockHeaderSize)) {
-            SetError(kErrBlockHeader, kAtBlockHeader);
-            return -1;
-        }
+        if (!RecordSumMatches(header, kBlockHeaderSize))
+            return Refuse(kErrBlockHeader, kAtBlockHeader);
     }
     return 1;
 }
@@ -283,14 +265,10 @@ int DvrDiskReader::ReadIndexEntries(wxFile* file, wxInt64 block, wxInt64 first, 
     if (!HasAdapter())
         return -1;
     const _HisiAdapter_t& adapter = *m_volume->adapter;
-    if (first < 0) {
-        SetError(kErrIndexNegative, kAtIndexNegative);
-        return -1;
-    }
-    if (first > kLastIndexEntry) {
-        SetError(kErrIndexBeyond, kAtIndexBeyond);
-        return -1;
-    }
+    if (first < 0)
+        return Refuse(kErrIndexNegative, kAtIndexNegative);
+    if (first > kLastIndexEntry)
+        return Refuse(kErrIndexBeyond, kAtIndexBeyond);
     wxInt64 nextBlock = 0;
     const wxInt64 position =
         __builtin_add_overflow(block, 1, &nextBlock)
@@ -299,10 +277,8 @@ int DvrDiskReader::ReadIndexEntries(wxFile* file, wxInt64 block, wxInt64 first, 
     if (BlockRead(file, position, buffer, RecordBytes(count, kIndexEntrySize)) < 0)
         return -1;
     for (wxInt64 j = 0; j < count; ++j) {
-        if (!RecordSumMatches(buffer + j * kIndexEntrySize, kIndexEntrySize)) {
-            SetError(kErrIndexEntry, kAtIndexEntry);
-            return -1;
-        }
+        if (!RecordSumMatches(buffer + j * kIndexEntrySize, kIndexEntrySize))
+            return Refuse(kErrIndexEntry, kAtIndexEntry);
     }
     return 1;
 }
@@ -312,15 +288,11 @@ int DvrDiskReader::ReadPayload(wxFile* file, wxInt64 block, int offset, int leng
     if (!HasAdapter())
         return -1;
     const _HisiAdapter_t& adapter = *m_volume->adapter;
-    if (offset < 0) {
-        SetError(kErrPayloadNegative, kAtPayloadNegative);
-        return -1;
-    }
+    if (offset < 0)
+        return Refuse(kErrPayloadNegative, kAtPayloadNegative);
     // Taken as unsigned 32 bits, so that a negative length is refused too.
-    if (static_cast<std::uint32_t>(static_cast<wxInt64>(offset) + length) > kPayloadAreaSize) {
-        SetError(kErrPayloadBeyond, kAtPayloadBeyond);
-        return -1;
-    }
+    if (static_cast<std::uint32_t>(static_cast<wxInt64>(offset) + length) > kPayloadAreaSize)
+        return Refuse(kErrPayloadBeyond, kAtPayloadBeyond);
     return BlockRead(file, RecordPosition(adapter.DataBlockOffset, block, kDataBlockSize, kBlockHeaderSize + offset),
                      buffer, length);
 }

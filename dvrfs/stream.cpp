@@ -58,10 +58,8 @@ int DvrDiskReader::get_stream(wxFile* file, unsigned char* payload, _HisiHeader_
                 ++m_streamFrame;
                 return size;
             }
-            if (passed == MaxEmptyBlocks(ringSize)) {
-                SetError(kErrNoFrame, kAtNoFrame);
-                return -1;
-            }
+            if (passed == MaxEmptyBlocks(ringSize))
+                return Refuse(kErrNoFrame, kAtNoFrame);
             if (m_streamBlock < INT64_MAX)
                 ++m_streamBlock;
             if (m_streamBlock > limit) {
@@ -90,10 +88,8 @@ int DvrDiskReader::get_stream(wxFile* file, unsigned char* payload, _HisiHeader_
             --m_streamFrame;
             return size;
         }
-        if (passed == MaxEmptyBlocks(ringSize)) {
-            SetError(kErrNoFrame, kAtNoFrame);
-            return -1;
-        }
+        if (passed == MaxEmptyBlocks(ringSize))
+            return Refuse(kErrNoFrame, kAtNoFrame);
         --m_streamBlock;  // not negative here: the header read above refuses negative blocks
         if (m_streamBlock < limit) {
             _HisiList_t newest{};
@@ -119,10 +115,8 @@ int DvrDiskReader::StreamRead(wxFile* file, char flags, wxInt64 block, int first
     const _HisiHeader_t& newest = entries[0];
     const _HisiHeader_t& oldest = entries[count - 1];
     const wxInt64 length = static_cast<wxInt64>(newest.DataOffset) + newest.DataSize - oldest.DataOffset;
-    if (length > INT_MAX || length < INT_MIN) {
-        SetError(kErrPayloadBeyond, kAtPayloadBeyond);
-        return -1;
-    }
+    if (length > INT_MAX || length < INT_MIN)
+        return Refuse(kErrPayloadBeyond, kAtPayloadBeyond);
     if ((flags & 2) &&
         ReadPayload(file, block, oldest.DataOffset, static_cast<int>(length), Bytes(payload)) < 0)
         return -1;

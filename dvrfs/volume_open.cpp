@@ -34,6 +34,12 @@ void DvrDiskReader::SetError(std::int32_t code, int number)
     SetErrorText(code, "%s[%d]", kFunctionWord, number);
 }
 
+int DvrDiskReader::Refuse(std::int32_t code, int number)
+{
+    SetError(code, number);
+    return -1;
+}
+
 void DvrDiskReader::SetErrorText(std::int32_t code, const char* format, ...)
 {
     m_errorCode = code;
@@ -156,10 +162,8 @@ int DvrDiskReader::ReloadBlockTable(wxFile* file, wxUint64 superOffset)
     const std::uint32_t count = m_volume->superBlock.BlockTableCount;
     m_volume->blockTable.clear();
     m_volume->blockTable.shrink_to_fit();
-    if (count > kMaxBlockTableCount) {
-        SetError(kErrTableSize, kAtTableSize);
-        return -1;
-    }
+    if (count > kMaxBlockTableCount)
+        return Refuse(kErrTableSize, kAtTableSize);
     m_volume->blockTable.assign(static_cast<std::size_t>(count) + 1, _H264BlockTable_t{});
     if (count != 0)
         HddataRead(file, reinterpret_cast<char*>(m_volume->blockTable.data()),
@@ -176,10 +180,8 @@ int DvrDiskReader::VerifySuperBlock()
                      static_cast<int>(super.HeaderSize), static_cast<int>(kSuperHeaderSize));
         return -1;
     }
-    if (super.Magic != kSuperMagic) {
-        SetError(kErrSuperBlock, kAtMagic);
-        return -1;
-    }
+    if (super.Magic != kSuperMagic)
+        return Refuse(kErrSuperBlock, kAtMagic);
     if (Checksum(reinterpret_cast<char*>(&super), kSuperHeaderSize) != 0) {
         m_errorCode = kErrSuperBlock;  // the text stays as the previous failure wrote it
         return -1;
@@ -199,10 +201,8 @@ int DvrDiskReader::VerifyBlockTable()
         for (std::uint64_t i = 0; i < bytes; ++i)
             sum ^= table[i];
     }
-    if (bytes > loaded || sum != super.BlockTableSum) {
-        SetError(kErrBlockTable, kAtBlockTable);
-        return -1;
-    }
+    if (bytes > loaded || sum != super.BlockTableSum)
+        return Refuse(kErrBlockTable, kAtBlockTable);
     return 1;
 }
 
@@ -218,8 +218,7 @@ bool DvrDiskReader::GeometryIsSound() const
 
 int DvrDiskReader::RefuseUnsoundGeometry()
 {
-    SetError(kErrGeometry, kAtGeometry);
-    return -1;
+    return Refuse(kErrGeometry, kAtGeometry);
 }
 
 bool DvrDiskReader::HasVolume()
@@ -279,10 +278,8 @@ wxInt64 DvrDiskReader::GetInfo(char selector)
         return adapter.DataBlockMax;
     case 49: {
         // Fill level of the data ring in percent, plus 100 once it has wrapped.
-        if (adapter.DataBlockMax <= 0) {
-            SetError(kErrRingEmpty, kAtInfoRing);
-            return -1;
-        }
+        if (adapter.DataBlockMax <= 0)
+            return Refuse(kErrRingEmpty, kAtInfoRing);
         const std::int64_t newest = adapter.LastList.EndBlock;
         std::int64_t level = 100 * newest / adapter.DataBlockMax;
         if (adapter.FirstList.StartBlock > newest)

@@ -232,6 +232,25 @@ TEST_F(AdapterTest, RefreshPassesOverUnreadableEntriesAndEndsAtTheNewestReadable
     EXPECT_EQ(reader_.m_errorCode, 50);  // left by the damaged entries on the way
 }
 
+TEST_F(AdapterTest, RefreshWalksAListSpanAcrossTheEndOfTheListRing)
+{
+    DiskImage image(SmallLayout());  // a list ring of 16 entries
+    const int positions[] = {14, 15, 0, 1};
+    for (int i = 0; i < 4; ++i)
+        image.Add(GeneratedRecording(positions[i], i, i, 1000 + 100 * i, 1050 + 100 * i, 8));
+    const std::string path = WriteImage(image);
+    image.Damage(Target::ListEntry, 1);
+    image.Damage(Target::ListMirror, 1);
+    Refingerprint(path);
+
+    ASSERT_EQ(OpenAndSearch(path), 1);
+    EXPECT_EQ(Adapter().FirstList.Idx, 14);
+    EXPECT_EQ(Adapter().LastList.Idx, 0);
+    EXPECT_EQ(Adapter().LastList.EndBlock, 2);
+    EXPECT_EQ(Adapter().StartTime, 1000u);
+    EXPECT_EQ(Adapter().EndTime, 1250u);
+}
+
 TEST_F(AdapterTest, RefreshFailsWhenTheOldestEntryCannotBeRead)
 {
     DiskImage image(SmallLayout());
