@@ -1,0 +1,83 @@
+#include "catalog/catalog_reader.h"
+
+#include <algorithm>
+#include <cstdio>
+#include <ctime>
+
+CatalogBuild CatalogReader::BuildCatalog(const wxString& path)
+{
+    if (OpenDVRFS(path) <= 0)
+        return CatalogBuild::kNotOpened;
+    if (Checkconfig() <= 0)
+        return CatalogBuild::kNotConfigured;
+    if (BlockOpe(m_diskFile, 2, nullptr, 0, 0) < 0)
+        return CatalogBuild::kNoAdapter;
+    Setplaylist();
+    return CatalogBuild::kBuilt;
+}
+
+void CatalogReader::Setplaylist()
+{
+    if (!m_catalog || !m_volume || !m_volume->adapter)
+        return;
+    for (CatalogEntry& entry : m_catalog->Entries) {
+        entry.Idx = -1;
+        entry.StartTime = 0;
+        entry.EndTime = 0;
+    }
+
+    // The list is a ring: a newest position below the oldest has wrapped.
+    const _HisiAdapter_t& adapter = *m_volume->adapter;
+    const std::int64_t ringSize = adapter.ListMax;
+    const std::int64_t first = adapter.FirstList.Idx;
+    std::int64_t last = adapter.LastList.Idx;
+    if (last < first)
+        last += ringSize;
+    if (last >= 0)
+        m_catalog->SpanCount = static_cast<std::uint16_t>(last - first + 1);
+    m_recordCount = 0;
+    if (last < first || ringSize <= 0)
+        return;
+
+    // Negative positions are skipped without a read, so the walk starts at
+    // the first one that is not.
+    for (std::int64_t position = std::max<std::int64_t>(first, 0); position <= last; ++position) {
+        if (m_recordCount == kCatalogCapacity)
+            return;
+        _HisiList_t record{};
+        if (BlockOpe(m_diskFile, 33, &record, position % ringSize, 1) < 0)
+            return;  // the entries made so far stay
+        FillEntry(m_catalog->Entries[m_recordCount], record);
+        ++m_recordCount;
+    }
+}
+
+namespace {
+
+// A field of a broken-down time (month, day, hour, minute, second): always
+// below 100, and typed so that the compiler sees the texts fit.
+unsigned char Field(int value)
+{
+    return static_cast<unsigned char>(value);
+}
+
+}  // namespace
+
+void CatalogReader::FillEntry(CatalogEntry& entry, const _HisiList_t& record)
+{
+    entry.Idx = record.Idx;
+    entry.StartTime = static_cast<std::int32_t>(record.StartTime);
+    entry.EndTime = static_cast<std::int32_t>(record.EndTime);
+
+    const std::time_t start = record.StartTime;
+    const std::time_t end = record.EndTime;
+    std::tm startUtc{};
+    std::tm endUtc{};
+    gmtime_r(&start, &startUtc);
+    gmtime_r(&end, &endUtc);
+    std::snprintf(entry.DateText, sizeof entry.DateText, "%04d/%02d/%02d", startUtc.tm_year + 1900,
+                  Field(startUtc.tm_mon + 1), Field(startUtc.tm_mday));
+    std::snprintf(entry.TimeText, sizeof entry.TimeText, "%02d:%02d:%02d-%02d:%02d:%02d", Field(startUtc.tm_hour),
+                  Field(startUtc.tm_min), Field(startUtc.tm_sec), Field(endUtc.tm_hour), Field(endUtc.tm_min),
+                  Field(endUtc.tm_sec));
+}

@@ -1,0 +1,184 @@
+// The catalogue build: the list ring walked from the oldest to the newest
+// recording into at most 8192 entries with their UTC texts.
+#include <string>
+#include <vector>
+
+#include "catalog/catalog_reader.h"
+#include "tests/support/disk_fixture.h"
+#include "tests/support/io_trace.h"
+
+namespace {
+
+using dvrimage::DiskImage;
+using dvrimage::GeneratedRecording;
+using dvrimage::Layout;
+using dvrimage::Recording;
+using dvrimage::Target;
+
+// A recording whose list entry is all there is of it; the newest recording
+// of a disk also needs its data block, for the adapter refresh.
+Recording EntryOnly(std::int32_t listIdx, std::uint32_t startTime, std::uint32_t endTime)
+{
+    Recording r = GeneratedRecording(listIdx, 0, 0, startTime, endTime, 8, 1, 16);
+    r.blocks.clear();
+    return r;
+}
+
+class CatalogBuildTest : public DiskTest {
+protected:
+    // A disk whose recordings sit at these list positions, oldest first.
+    std::string WriteDisk(const std::vector<int>& positions, Layout layout = SmallLayout(),
+                          const std::string& name = "disk.img")
+    {
+        image_ = std::make_unique<DiskImage>(layout);
+        for (std::size_t i = 0; i < positions.size(); ++i) {
+            const std::uint32_t start = 1000 * static_cast<std::uint32_t>(positions[i]);
+            if (i + 1 == positions.size())
+                image_->Add(GeneratedRecording(positions[i], 0, 0, start, start + 500, layout.dataBlockMax, 1, 16));
+            else
+                image_->Add(EntryOnly(positions[i], start, start + 500));
+        }
+        return WriteImage(*image_, name);
+    }
+
+    CatalogBuild Build(const std::string& path) { return catalog_.BuildCatalog(wxString::FromUTF8(path.c_str())); }
+
+    std::vector<int> Indices() const
+    {
+        std::vector<int> indices;
+        for (int i = 0; i < catalog_.m_recordCount; ++i)
+            indices.push_back(catalog_.m_catalog->Entries[i].Idx);
+        return indices;
+    }
+
+    CatalogReader catalog_;
+    std::unique_ptr<DiskImage> image_;
+};
+
+TEST_F(CatalogBuildTest, WrappedSpanIsReadFromTheOldestAroundTheRingToTheNewest)
+{
+    Layout layout = SmallLayout();
+    layout.listMax = 10;
+    const std::string path = WriteDisk({5, 6, 7, 8, 9, 0, 1, 2}, layout);
+
+    ASSERT_EQ(Build(path), CatalogBuild::kBuilt);
+    EXPECT_EQ(Indices(), (std::vector<int>{5, 6, 7, 8, 9, 0, 1, 2}));
+    EXPECT_EQ(catalog_.m_catalog->SpanCount, 8);
+    EXPECT_EQ(catalog_.m_catalog->Entries[0].StartTime, 5000);
+    EXPECT_EQ(catalog_.m_catalog->Entries[7].EndTime, 2500);
+    EXPECT_EQ(catalog_.m_catalog->Entries[8].Idx, -1);
+}
+
+TEST_F(CatalogBuildTest, SingleRecording)
+{
+    const std::string path = WriteDisk({4});
+    ASSERT_EQ(Build(path), CatalogBuild::kBuilt);
+    EXPECT_EQ(Indices(), (std::vector<int>{4}));
+    EXPECT_EQ(catalog_.m_catalog->SpanCount, 1);
+}
+
+TEST_F(CatalogBuildTest, EntryDamagedInBothCopiesEndsTheWalkThere)
+{
+    const std::string path = WriteDisk({0, 1, 2, 3, 4});
+    image_->Damage(Target::ListEntry, 2);
+    image_->Damage(Target::ListMirror, 2);
+    image_->Damage(Target::ListEntry, 1);  // repaired from the mirror
+    Refingerprint(path);
+
+    ASSERT_EQ(Build(path), CatalogBuild::kBuilt);
+    EXPECT_EQ(Indices(), (std::vector<int>{0, 1}));
+    EXPECT_EQ(catalog_.m_catalog->SpanCount, 5);
+    EXPECT_EQ(catalog_.m_errorCode, 50);
+}
+
+TEST_F(CatalogBuildTest, NegativePositionsAreSkippedWithoutAReadAndAHugeSpanIsCutTo16Bits)
+{
+    const std::string path = WriteDisk({0, 1, 2});
+    ASSERT_EQ(Build(path), CatalogBuild::kBuilt);
+    // A span from position -70000 to 2: only 0, 1 and 2 can be read.
+    catalog_.m_volume->adapter->FirstList.Idx = -70000;
+    iotrace::Reset();
+    catalog_.Setplaylist();
+    EXPECT_EQ(Indices(), (std::vector<int>{0, 1, 2}));
+    EXPECT_EQ(catalog_.m_catalog->SpanCount, (70003 & 0xFFFF));
+    EXPECT_EQ(iotrace::Reads(path).size(), 3u);
+}
+
+TEST_F(CatalogBuildTest, NewestBelowZeroAndBelowTheOldestCountsAsWrapped)
+{
+    const std::string path = WriteDisk({3, 4, 5});  // a ring of 16
+    ASSERT_EQ(Build(path), CatalogBuild::kBuilt);
+    catalog_.m_volume->adapter->LastList.Idx = -2;  // -2 + 16 = 14: read from 3 until the first unreadable
+    catalog_.Setplaylist();
+    EXPECT_EQ(Indices(), (std::vector<int>{3, 4, 5}));
+    EXPECT_EQ(catalog_.m_catalog->SpanCount, 12);
+
+    catalog_.m_volume->adapter->LastList.Idx = -20;  // still below the oldest: nothing, and no span
+    catalog_.m_catalog->SpanCount = 77;
+    catalog_.Setplaylist();
+    EXPECT_EQ(catalog_.m_recordCount, 0);
+    EXPECT_EQ(catalog_.m_catalog->SpanCount, 77);
+    EXPECT_EQ(catalog_.m_catalog->Entries[0].Idx, -1);
+}
+
+TEST_F(CatalogBuildTest, TakesTheFirst8192OfALongerSpan)
+{
+    Layout layout = SmallLayout();
+    layout.listMax = 9000;
+    std::vector<int> positions;
+    for (int i = 0; i < 9000; ++i)
+        positions.push_back(i);
+    const std::string path = WriteDisk(positions, layout);
+
+    ASSERT_EQ(Build(path), CatalogBuild::kBuilt);
+    EXPECT_EQ(catalog_.m_recordCount, 8192);
+    EXPECT_EQ(catalog_.m_catalog->Entries[8191].Idx, 8191);
+    EXPECT_EQ(catalog_.m_catalog->SpanCount, 9000);
+}
+
+TEST_F(CatalogBuildTest, TextsAreUtcDateAndClockTimes)
+{
+    DiskImage image(SmallLayout());
+    image.Add(EntryOnly(0, 0, 86399));
+    image.Add(EntryOnly(1, 1700000000, 1700003723));
+    image.Add(GeneratedRecording(2, 0, 0, 951782400, 951868799, 8, 1, 16));  // 29 February 2000
+    ASSERT_EQ(Build(WriteImage(image)), CatalogBuild::kBuilt);
+
+    const CatalogEntry* e = catalog_.m_catalog->Entries;
+    EXPECT_STREQ(e[0].DateText, "1970/01/01");
+    EXPECT_STREQ(e[0].TimeText, "00:00:00-23:59:59");
+    EXPECT_STREQ(e[1].DateText, "2023/11/14");
+    EXPECT_STREQ(e[1].TimeText, "22:13:20-23:15:23");
+    EXPECT_STREQ(e[2].DateText, "2000/02/29");
+    EXPECT_STREQ(e[2].TimeText, "00:00:00-23:59:59");
+}
+
+TEST_F(CatalogBuildTest, SecondBuildReplacesTheFirstAndAFailedOneKeepsIt)
+{
+    const std::string first = WriteDisk({0, 1, 2, 3, 4}, SmallLayout(), "first.img");
+    const std::string second = WriteDisk({7, 8}, SmallLayout(), "second.img");
+    ASSERT_EQ(Build(first), CatalogBuild::kBuilt);
+    RecordCatalog* catalog = catalog_.m_catalog;
+
+    ASSERT_EQ(Build(second), CatalogBuild::kBuilt);
+    EXPECT_EQ(catalog_.m_catalog, catalog);
+    EXPECT_EQ(Indices(), (std::vector<int>{7, 8}));
+    EXPECT_EQ(catalog->Entries[2].Idx, -1);
+    EXPECT_EQ(catalog->Entries[2].StartTime, 0);
+    EXPECT_STREQ(catalog->Entries[2].DateText, "1970/01/01");  // texts of the first build stay
+
+    EXPECT_EQ(Build(dir_ + "/missing.img"), CatalogBuild::kNotOpened);
+    EXPECT_EQ(Indices(), (std::vector<int>{7, 8}));
+
+    Layout unconfigured = SmallLayout();
+    unconfigured.version = 0;
+    DiskImage blank(unconfigured);
+    EXPECT_EQ(Build(WriteImage(blank, "blank.img")), CatalogBuild::kNotConfigured);
+    Layout noAdapter = SmallLayout();
+    noAdapter.adapterRuns.clear();
+    DiskImage empty(noAdapter);
+    EXPECT_EQ(Build(WriteImage(empty, "empty.img")), CatalogBuild::kNoAdapter);
+    EXPECT_EQ(Indices(), (std::vector<int>{7, 8}));
+}
+
+}  // namespace
