@@ -1,0 +1,161 @@
+#!/usr/bin/env bash
+# End to end: mkdvrfs writes disks, every dvrfs command reads them; output and
+# exit statuses compared exactly.
+#   dvrfs_cli_test.sh MKDVRFS DVRFS
+set -u
+mkdvrfs=$1
+dvrfs=$2
+work=$(mktemp -d)
+trap 'rm -rf "$work"' EXIT
+failures=0
+checks=0
+
+check() {  # check NAME EXPECTED ACTUAL
+  checks=$((checks + 1))
+  if [ "$2" != "$3" ]; then
+    echo "FAIL: $1"
+    diff <(printf '%s\n' "$2") <(printf '%s\n' "$3")
+    failures=$((failures + 1))
+  fi
+}
+
+# --- mkdvrfs
+"$mkdvrfs" --help | grep -q '^Usage: mkdvrfs'
+check "mkdvrfs --help" 0 $?
+"$mkdvrfs" --no-such-option "$work/x.img" 2>/dev/null
+check "mkdvrfs usage error" 2 $?
+"$mkdvrfs" --damage list "$work/x.img" 2>/dev/null
+check "mkdvrfs damage without index" 2 $?
+
+# --- info
+"$mkdvrfs" --adapter-run 110:15 \
+  --recording 0:0:2:1700000000:1700000600 \
+  --recording 1:6:1:1700000700:1700001500 --damage list:0 "$work/disk.img" >/dev/null
+out=$("$dvrfs" info "$work/disk.img" --dump)
+check "info exit status" 0 $?
+check "info output" "magic=0x1234
+header_size=252
+block_size=4096
+block_count=32892
+block_table_count=4
+offset_block_space=1048576
+super_offset=0
+super_offset_backup=524288
+adapter_slot=4
+adapter_version=1
+list_max=64
+data_block_max=8
+first_list=0
+last_list=1
+record_sum=90
+start_time=1700000000
+end_time=1700001500
+info_1=0
+info_3=0
+info_17=1
+info_19=10
+info_33=64
+info_35=8
+info_49=12
+info_50=1014
+	Adapter: Version=1, TimeStamp=1014, Idx=4, Magic=0x48444152
+	List: Offset=491520, OffsetBackup=499712, Max=64
+	DataBlock: Offset=507904, Max=8
+	StartTime=22:13:20(1700000000), EndTime=22:38:20(1700001500)" "$out"
+
+"$mkdvrfs" --damage primary-super "$work/bad.img" >/dev/null
+err=$("$dvrfs" info "$work/bad.img" 2>&1 >/dev/null)
+check "info on a damaged superblock" 1 $?
+check "info says why" "dvrfs: $work/bad.img: not a recorder disk: the superblock is damaged (code 33)" "$err"
+"$mkdvrfs" --version 0 "$work/blank.img" >/dev/null
+err=$("$dvrfs" info "$work/blank.img" 2>&1 >/dev/null)
+check "info on an unconfigured disk" 1 $?
+check "info on an unconfigured disk says so" \
+  "dvrfs: $work/blank.img: no recorder was ever configured on this disk" "$err"
+"$dvrfs" info >/dev/null 2>&1
+check "usage error" 2 $?
+"$dvrfs" --help | grep -q '^Usage: dvrfs'
+check "dvrfs --help" 0 $?
+
+# --- list: a list span that wraps the list ring of 64, one entry repaired
+"$mkdvrfs" --recording 62:0:0:0:86399 --recording 63:1:1:1700000000:1700003723 \
+  --recording 0:2:3:951782400:951868799 --damage list:63 "$work/list.img" >/dev/null
+out=$("$dvrfs" list "$work/list.img")
+check "list exit status" 0 $?
+check "list output" "$(printf '0\t62\t0\t86399\t1970/01/01 00:00:00-23:59:59
+1\t63\t1700000000\t1700003723\t2023/11/14 22:13:20-23:15:23
+2\t0\t951782400\t951868799\t2000/02/29 00:00:00-23:59:59')" "$out"
+out=$("$dvrfs" list "$work/list.img" --json)
+check "list --json" '{"span_count": 3, "recordings": [{"row": 0, "idx": 62, "start": 0, "end": 86399, "date": "1970/01/01", "time": "00:00:00-23:59:59"}, {"row": 1, "idx": 63, "start": 1700000000, "end": 1700003723, "date": "2023/11/14", "time": "22:13:20-23:15:23"}, {"row": 2, "idx": 0, "start": 951782400, "end": 951868799, "date": "2000/02/29", "time": "00:00:00-23:59:59"}], "error": {"code": 50, "text": "FUNCTION[1463]"}}' "$out"
+"$mkdvrfs" --recording 5:0:0:100:200 "$work/one.img" >/dev/null
+out=$("$dvrfs" list "$work/one.img" --json)
+check "list --json of an untroubled disk" '{"span_count": 1, "recordings": [{"row": 0, "idx": 5, "start": 100, "end": 200, "date": "1970/01/01", "time": "00:01:40-00:03:20"}], "error": null}' "$out"
+"$mkdvrfs" --recording 0:0:0:100:200 --recording 1:1:1:300:400 --recording 2:2:2:500:600 \
+  --damage list:1 --damage mirror:1 "$work/cut.img" >/dev/null
+out=$("$dvrfs" list "$work/cut.img")
+check "list stops at an entry damaged in both copies" "$(printf '0\t0\t100\t200\t1970/01/01 00:01:40-00:03:20')" "$out"
+"$dvrfs" list "$work/bad.img" >/dev/null 2>&1
+check "list of a damaged superblock" 1 $?
+"$mkdvrfs" --adapter-run 5:0 "$work/noadapter.img" >/dev/null
+err=$("$dvrfs" list "$work/noadapter.img" 2>&1)
+check "list without an adapter" 1 $?
+check "list without an adapter says so" \
+  "dvrfs: $work/noadapter.img: no current state record: a record lies outside the disk (code 36: FUNCTION[1141])" "$err"
+
+# --- verify
+out=$("$dvrfs" verify "$work/one.img")
+check "verify of a sound disk" 0 $?
+check "verify of a sound disk says so" "summary: 130 records checked, 0 damaged, 0 repaired" "$out"
+"$mkdvrfs" --adapter-run 0:3 --recording 0:0:1:100:200 --recording 1:2:3:300:400 \
+  --damage backup-super --damage adapter:1 --damage list:0 --damage mirror:1 \
+  --damage header:2 --damage index:1:2 "$work/damaged.img" >/dev/null
+out=$("$dvrfs" verify "$work/damaged.img")
+check "verify of a damaged disk" 3 $?
+check "verify reports each damaged record" "damaged: backup superblock
+damaged: adapter slot 1
+repaired: list entry 0 (ring copy damaged, mirror copy used)
+damaged: list entry 1 (mirror copy)
+damaged: data block 1 index entry 2
+damaged: data block 2 header
+summary: 140 records checked, 5 damaged, 1 repaired" "$out"
+"$mkdvrfs" --damage backup-table "$work/table.img" >/dev/null
+out=$("$dvrfs" verify "$work/table.img")
+check "verify of a damaged backup table" 3 $?
+check "verify reports the backup table" "damaged: backup block table
+summary: 124 records checked, 1 damaged, 0 repaired" "$out"
+out=$("$dvrfs" verify "$work/bad.img" 2>/dev/null)
+check "verify of a damaged primary superblock" 1 $?
+check "verify reports the primary superblock" "damaged: primary superblock
+summary: 0 records checked, 1 damaged, 0 repaired" "$out"
+
+# --- extract: frames from a file, across the end of the data ring
+for i in $(seq 1 300); do printf 'frame-%04d-' "$i"; done > "$work/frames.bin"
+"$mkdvrfs" --frames "$work/frames.bin" --frame-size 1100 \
+  --recording 0:2:3:100:200:3 --recording 1:7:0:300:400:2 --damage index:2:1 "$work/play.img" >/dev/null
+frame() { head -c $((1100 * $1)) "$work/frames.bin" | tail -c 1100; }
+out=$("$dvrfs" extract "$work/play.img" 1 -o "$work/wrapped.es")
+check "extract exit status" 0 $?
+check "extract says what it wrote" "4 frames, 4400 bytes written to $work/wrapped.es" "$out"
+check "extract writes the frames in order across the end of the ring" \
+  "$( (frame 1; frame 2; frame 3; frame 1) | od -c)" "$(od -c < "$work/wrapped.es")"
+"$dvrfs" extract "$work/play.img" 1 -o "$work/wrapped.es" 2>/dev/null
+check "extract refuses to replace a file" 2 $?
+out=$("$dvrfs" extract "$work/play.img" 0 -o "$work/wrapped.es" --force 2>"$work/warning")
+check "extract --force replaces it" "5 frames, 5500 bytes written to $work/wrapped.es" "$out"
+check "extract warns of the damaged frame it left out" \
+  "dvrfs: warning: 1 damaged frame(s) and 0 damaged block(s) left out" "$(cat "$work/warning")"
+check "extract leaves out only the damaged frame" \
+  "$( (frame 1; frame 3; frame 1; frame 2; frame 3) | od -c)" "$(od -c < "$work/wrapped.es")"
+"$dvrfs" extract "$work/play.img" 2 -o "$work/none.es" 2>/dev/null
+check "extract of a row that is not there" 2 $?
+before=$(cksum < "$work/play.img")
+"$dvrfs" extract "$work/play.img" 0 -o "$work/play.img" --force 2>/dev/null
+check "extract refuses to write into the disk" 2 $?
+check "the disk is untouched" "$before" "$(cksum < "$work/play.img")"
+"$dvrfs" extract "$work/play.img" x -o "$work/x.es" 2>/dev/null
+check "extract of a row that is no number" 2 $?
+test ! -e "$work/none.es" && test ! -e "$work/x.es"
+check "refused extracts write nothing" 0 $?
+
+echo "$((checks - failures)) passed, $failures failed"
+[ "$failures" -eq 0 ]

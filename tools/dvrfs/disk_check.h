@@ -1,0 +1,58 @@
+// What the dvrfs command does with a disk, as library functions: the
+// verification walk over every structure and the extraction of a
+// recording's stream. The command, the benchmarks and the fuzzers use them.
+#ifndef TOOLS_DVRFS_DISK_CHECK_H
+#define TOOLS_DVRFS_DISK_CHECK_H
+
+#include <cstddef>
+#include <cstdint>
+#include <functional>
+#include <string>
+
+#include "catalog/catalog_reader.h"
+
+namespace dvrfstool {
+
+// How far a verification got before it had to stop.
+enum class VerifyStage {
+    kNotOpened,      // no volume: the disk or its primary superblock or table failed
+    kNotConfigured,  // no recorder configured on the disk
+    kNoAdapter,      // no current adapter
+    kComplete,       // every structure the adapter leads to was read
+};
+
+struct VerifyResult {
+    VerifyStage stage = VerifyStage::kNotOpened;
+    long long checked = 0;   // records read and checked
+    long long damaged = 0;   // records that failed their checks
+    long long repaired = 0;  // list entries whose ring copy failed and whose mirror copy holds
+};
+
+// Reads every structure of the disk once and reports each damaged or
+// repaired record as one line ("damaged: ...", "repaired: ...").
+VerifyResult VerifyDisk(CatalogReader& reader, const wxString& path,
+                        const std::function<void(const std::string&)>& report);
+
+struct ExtractResult {
+    long long frames = 0;
+    long long bytes = 0;
+    long long skippedFrames = 0;  // frames whose index entry or payload could not be read
+    long long skippedBlocks = 0;  // blocks whose header could not be read
+    bool written = true;          // false when the sink refused a frame
+};
+
+// The list entry of catalogue row `row` of a built catalogue, read again from
+// the disk; false when there is no such row or it cannot be read.
+bool RecordingOfRow(CatalogReader& reader, int row, _HisiList_t* recording);
+
+// Hands the payload of every frame of the recording to `sink`, in order, from
+// frame 0 of its first data block to the last frame of its last one, across
+// the end of the data ring when it wraps. Damaged frames and blocks are
+// passed over and counted. `progress` hears the fraction of blocks done.
+ExtractResult ExtractRecording(CatalogReader& reader, const _HisiList_t& recording,
+                               const std::function<bool(const unsigned char*, std::size_t)>& sink,
+                               const std::function<void(double)>& progress = {});
+
+}  // namespace dvrfstool
+
+#endif
