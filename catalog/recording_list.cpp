@@ -1,0 +1,40 @@
+// The catalogue build as the panel runs it when a drive is chosen, and the
+// refill of the recording list from the catalogue.
+#include <wx/datetime.h>
+
+#include "controls/plug_list_ctrl.h"
+#include "panel/drive_discovery.h"
+#include "panel/morvane_plug_config.h"
+
+namespace {
+
+// Seconds since 1970 (UTC) as the workstation's local date and time.
+wxString LocalDateTime(std::int32_t seconds)
+{
+    const wxDateTime when(wxLongLong(seconds) * 1000);
+    const wxDateTime::Tm tm = when.GetTm(wxDateTime::Local);
+    return wxString::Format("%04d/%02d/%02d %02d:%02d:%02d", tm.year, tm.mon + 1, tm.mday, tm.hour, tm.min, tm.sec);
+}
+
+}  // namespace
+
+void MorvanePlugConfig::SendHddList(int drive)
+{
+    m_diskPath = DiskPathForDrive(drive);
+    if (BuildCatalog(wxString(m_diskPath)) == CatalogBuild::kBuilt)
+        Setwxlist();
+}
+
+void MorvanePlugConfig::Setwxlist()
+{
+    m_recordList->DeleteAllItems();
+    m_recordList->Show(false);
+    for (int i = 0; i < m_recordCount; ++i) {
+        const CatalogEntry& entry = m_catalog->Entries[i];
+        const long item = m_recordList->InsertItem(i, wxString::Format("%d.", i), 0);
+        m_recordList->SetItemData(item, entry.StartTime);
+        m_recordList->SetItem(item, 1, LocalDateTime(entry.StartTime), -1);
+        m_recordList->SetItem(item, 2, LocalDateTime(entry.EndTime), -1);
+    }
+    m_recordList->Show(true);
+}

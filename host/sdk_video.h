@@ -1,0 +1,83 @@
+// The host SDK's video: the OpenGL canvas that shows DVR channels, and the
+// decoder thread that feeds it.
+#ifndef HOST_SDK_VIDEO_H
+#define HOST_SDK_VIDEO_H
+
+#include <atomic>
+#include <mutex>
+#include <condition_variable>
+#include <vector>
+
+#include <wx/glcanvas.h>
+#include <wx/thread.h>
+
+#include "host/sdk_api.h"
+#include "host/sdk_services.h"
+
+class QRIX_SDK_API BasicGLPane : public wxGLCanvas {
+public:
+    // `context` is the shared context of the host's frame manager; a canvas
+    // without one shows nothing.
+    BasicGLPane(wxWindow* parent, int* attributes, wxGLContext* context, const wxPoint& pos, const wxSize& size);
+
+    void Init();
+    void OnEraseBackground(wxEraseEvent& event);
+    void OnRender(wxPaintEvent& event);
+    // Operation 2: take the newest pictures and repaint.
+    void ProcessTexture(int operation, _TEXTURE_DATA* texture);
+    void Reset(int channel, int type);
+    void SetOnAllChannels(unsigned long long address, int channelCount, int type);
+    void SetOffAllChannels(unsigned long long address, int channelCount, int type);
+    int getWidth();
+
+    // What the canvas was asked to do, for whoever watches the host.
+    struct Call {
+        enum Kind { kReset, kOn, kOff } kind;
+        unsigned long long address;
+        int count;
+        int type;
+    };
+    const std::vector<Call>& Calls() const { return m_calls; }
+    int TextureUpdates() const { return m_textureUpdates; }
+    int Renders() const { return m_renders; }
+    int ChannelsShown() const { return m_channelsShown; }
+
+private:
+    wxGLContext* m_context;
+    std::vector<Call> m_calls;
+    int m_textureUpdates = 0;
+    int m_renders = 0;
+    int m_channelsShown = 0;
+};
+
+// A decoder thread for the channels of one DVR. It runs detached: Delete
+// returns at once and the thread disposes of itself; StopDecoder, called
+// before, waits until the thread touches nothing outside itself any more.
+class QRIX_SDK_API ChannelDecoder : public wxThread {
+public:
+    explicit ChannelDecoder(wxEvtHandler* handler);
+    ~ChannelDecoder() override;
+
+    void SetCanvas(BasicGLPane* canvas);
+    void SetConnectType(int type);
+    void SetIpAndChannel(unsigned long long address, int channelCount);
+    virtual void StopDecoder();
+
+    long long m_dvrId;       // the DVR this decoder serves
+    wxString* m_filePath;    // the file or disk it reads, for file and disk playback
+
+protected:
+    ExitCode Entry() override;
+
+    std::mutex m_mutex;
+    std::condition_variable m_changed;
+    BasicGLPane* m_canvas = nullptr;
+    int m_connectType = 0;
+    unsigned long long m_address = 0;
+    int m_channelCount = 0;
+    bool m_stopRequested = false;
+    bool m_idle = false;  // the worker acknowledged the stop and touches nothing any more
+    wxString m_filePathText;
+};
+
+#endif
