@@ -66,4 +66,8 @@ void MorvanePlugConfig::SetDriverTrees()
             break;
     }
     probe.Close();
+    // The drives are what the user came for: show them without a click on
+    // the expand button first.
+    if (tree->ItemHasChildren(root))
+        tree->Expand(root);
 }

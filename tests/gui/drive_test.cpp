@@ -1,0 +1,159 @@
+// Drive discovery, the drive tree, and choosing a drive in its popup.
+#include <cstdlib>
+
+#include "panel/drive_discovery.h"
+#include "tests/gui/panel_fixture.h"
+
+namespace {
+
+struct TreeItem {
+    wxString text;
+    int drive;
+    bool operator==(const TreeItem& o) const { return text == o.text && drive == o.drive; }
+};
+
+std::ostream& operator<<(std::ostream& out, const TreeItem& item)
+{
+    return out << item.text << "=" << item.drive;
+}
+
+std::vector<TreeItem> Drives(MorvanePlugConfig* p)
+{
+    CInTreeCombo* tree = p->m_driveCombo->m_treePopup;
+    std::vector<TreeItem> items;
+    wxTreeItemIdValue cookie;
+    for (wxTreeItemId c = tree->GetFirstChild(tree->GetRootItem(), cookie); c.IsOk();
+         c = tree->GetNextChild(tree->GetRootItem(), cookie))
+        items.push_back({tree->GetItemText(c), static_cast<CDriverTreeNode*>(tree->GetItemData(c))->m_driveIndex});
+    return items;
+}
+
+// A left press at a point of the tree, as the mouse would give it.
+void PressAt(CInTreeCombo* tree, const wxPoint& at)
+{
+    wxMouseEvent move(wxEVT_MOTION);
+    move.SetPosition(at);
+    move.SetEventObject(tree);
+    tree->GetEventHandler()->ProcessEvent(move);
+    wxMouseEvent press(wxEVT_LEFT_DOWN);
+    press.SetPosition(at);
+    press.SetEventObject(tree);
+    press.m_leftDown = true;
+    tree->GetEventHandler()->ProcessEvent(press);
+}
+
+wxTreeItemId ItemWithText(CInTreeCombo* tree, const wxString& text)
+{
+    return text == tree->GetItemText(tree->GetRootItem()) ? tree->GetRootItem()
+                                                          : tree->FindItemByText(tree->GetRootItem(), text);
+}
+
+wxPoint LabelCentre(CInTreeCombo* tree, const wxString& text)
+{
+    wxRect rect;
+    tree->GetBoundingRect(ItemWithText(tree, text), rect, true);
+    return wxPoint(rect.x + rect.width / 2, rect.y + rect.height / 2);
+}
+
+TEST_F(PanelTest, TreeListsEveryDriveUpToTheFirstThatCannotBeOpened)
+{
+    WriteNonDisk(0);
+    WriteNonDisk(1);
+    WriteNonDisk(2);
+    WriteNonDisk(4);
+    MorvanePlugConfig* p = OpenPanel();
+    CInTreeCombo* tree = p->m_driveCombo->m_treePopup;
+    EXPECT_EQ(tree->GetItemText(tree->GetRootItem()), "Drivers");
+    EXPECT_EQ(Drives(p), (std::vector<TreeItem>{{"PHYSICALDRIVE0", 0}, {"PHYSICALDRIVE1", 1}, {"PHYSICALDRIVE2", 2}}));
+}
+
+TEST_F(PanelTest, AGapInTheNumberingHidesEveryDriveAfterIt)
+{
+    WriteNonDisk(0);
+    WriteNonDisk(2);
+    EXPECT_EQ(Drives(OpenPanel()), (std::vector<TreeItem>{{"PHYSICALDRIVE0", 0}}));
+}
+
+TEST_F(PanelTest, DrivePatternNeedsExactlyOneNumber)
+{
+    ::setenv("MORVANE_DISK_PATTERN", "/images/disk%d.img", 1);
+    EXPECT_EQ(DiskPathForDrive(3), "/images/disk3.img");
+    ::setenv("MORVANE_DISK_PATTERN", "/images/disk%s%d", 1);
+    EXPECT_EQ(DiskPathForDrive(3), "");
+    ::setenv("MORVANE_DISK_PATTERN", "/images/disk", 1);
+    EXPECT_EQ(DiskPathForDrive(3), "");
+    ::unsetenv("MORVANE_DISK_PATTERN");
+    EXPECT_EQ(DiskPathForDrive(0), "/dev/sda");
+    EXPECT_EQ(DiskPathForDrive(25), "/dev/sdz");
+    EXPECT_EQ(DiskPathForDrive(26), "");
+}
+
+TEST_F(PanelTest, PressOnADriveLabelBuildsItsCatalogueAndClosesThePopup)
+{
+    WriteDisk(0, {{100, 200}});
+    WriteDisk(1, {{1700000000, 1700000600}, {1700001000, 1700001600}, {1700002000, 1700002600}});
+    MorvanePlugConfig* p = OpenPanel();
+    CInTreeCombo* tree = p->m_driveCombo->m_treePopup;
+    p->m_driveCombo->Popup();
+    gui::Pump(100);
+
+    PressAt(tree, LabelCentre(tree, "PHYSICALDRIVE1"));
+    gui::Pump(100);
+    EXPECT_EQ(p->m_diskPath, wxString(dir_ + "/disk1.img"));
+    EXPECT_EQ(p->m_recordCount, 3);
+    EXPECT_EQ(p->m_recordList->GetItemCount(), 3);
+    EXPECT_EQ(p->m_driveCombo->GetValue(), "PHYSICALDRIVE1");
+    EXPECT_FALSE(p->m_driveCombo->IsPopupShown());
+}
+
+TEST_F(PanelTest, PressOnTheRootChoosesItWithoutReadingADisk)
+{
+    WriteDisk(0, {{100, 200}});
+    MorvanePlugConfig* p = OpenPanel();
+    CInTreeCombo* tree = p->m_driveCombo->m_treePopup;
+    p->m_driveCombo->Popup();
+    gui::Pump(100);
+
+    PressAt(tree, LabelCentre(tree, "Drivers"));
+    gui::Pump(50);
+    EXPECT_EQ(p->m_driveCombo->GetValue(), "Drivers");
+    EXPECT_TRUE(p->m_diskPath.empty());
+    EXPECT_EQ(p->m_catalog, nullptr);
+    EXPECT_FALSE(p->m_driveCombo->IsPopupShown());
+}
+
+TEST_F(PanelTest, PressBesideALabelChoosesNothingAndKeepsThePopupOpen)
+{
+    WriteDisk(0, {{100, 200}});
+    MorvanePlugConfig* p = OpenPanel();
+    CInTreeCombo* tree = p->m_driveCombo->m_treePopup;
+    p->m_driveCombo->Popup();
+    gui::Pump(100);
+
+    wxRect label;
+    tree->GetBoundingRect(tree->FindItemByText(tree->GetRootItem(), "PHYSICALDRIVE0"), label, true);
+    PressAt(tree, wxPoint(label.GetRight() + 40, label.y + label.height / 2));
+    gui::Pump(50);
+    EXPECT_TRUE(p->m_driveCombo->IsPopupShown());
+    EXPECT_TRUE(p->m_diskPath.empty());
+    EXPECT_EQ(p->m_driveCombo->GetValue(), "");
+    p->m_driveCombo->Dismiss();
+}
+
+TEST_F(PanelTest, PopupSizeAndTextValue)
+{
+    WriteNonDisk(0);
+    MorvanePlugConfig* p = OpenPanel();
+    CInTreeCombo* tree = p->m_driveCombo->m_treePopup;
+    EXPECT_EQ(tree->GetAdjustedSize(120, 500, 400), wxSize(300, 250));
+    EXPECT_EQ(tree->GetAdjustedSize(420, 500, 180), wxSize(420, 180));
+
+    EXPECT_EQ(tree->GetStringValue(), "");
+    tree->SetStringValue("Drivers");  // the root is never found
+    EXPECT_EQ(tree->GetStringValue(), "");
+    tree->SetStringValue("PHYSICALDRIVE0");
+    EXPECT_EQ(tree->GetStringValue(), "PHYSICALDRIVE0");
+    EXPECT_TRUE(p->m_diskPath.empty());  // choosing by text reads nothing
+}
+
+}  // namespace

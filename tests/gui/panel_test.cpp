@@ -1,0 +1,171 @@
+// The panel's dialog and layout, and its life: opening, closing, deleting.
+#include <algorithm>
+
+#include <wx/toplevel.h>
+
+#include "tests/gui/panel_fixture.h"
+
+namespace {
+
+wxRect Bounds(wxWindow* w)
+{
+    return wxRect(w->GetPosition(), w->GetSize());
+}
+
+void Resize(MorvanePlugConfig* panel, int width, int height)
+{
+    wxSizeEvent event(wxSize(width, height));
+    panel->OnSize(event);
+}
+
+bool IsTopLevel(wxWindow* window)
+{
+    for (wxWindow* w : wxTopLevelWindows)
+        if (w == window)
+            return true;
+    return false;
+}
+
+TEST_F(PanelTest, DialogAndWidgetsAreBuiltAsSpecifiedAndShown)
+{
+    MorvanePlugConfig* p = OpenPanel();
+    ASSERT_NE(p, nullptr);
+    EXPECT_TRUE(p->m_dialog->IsShown());
+    EXPECT_EQ(p->m_dialog->GetTitle(), "Morvane");
+    EXPECT_EQ(p->m_dialog->GetWindowStyleFlag() & 0x20001E00, 0x20001E00);
+    EXPECT_EQ(p->m_dialog->GetBackgroundColour(), wxColour(80, 58, 77));
+    EXPECT_EQ(p->m_driveLabel->GetId(), 1010);
+    EXPECT_EQ(p->m_driveLabel->GetLabel(), "Select Dvr");
+    EXPECT_EQ(p->m_driveLabel->GetPosition(), wxPoint(75, 4));
+    EXPECT_EQ(p->m_driveCombo->GetId(), 1011);
+    EXPECT_EQ(p->m_recordList->GetId(), 1012);
+    EXPECT_EQ(p->m_recordList->GetColumnCount(), 3);
+    wxListItem column;
+    column.SetMask(wxLIST_MASK_TEXT | wxLIST_MASK_WIDTH);
+    p->m_recordList->GetColumn(1, column);
+    EXPECT_EQ(column.GetText(), "Start Time");
+    EXPECT_EQ(column.GetWidth(), 150);
+    EXPECT_EQ(p->m_buttonSize, wxSize(30, 30));
+    int id = 1028;
+    for (wxBitmapButton* b : {p->m_btnPlay, p->m_btnPause, p->m_btnStop, p->m_btnReverse, p->m_btnForward, p->m_btnSwitch}) {
+        EXPECT_EQ(b->GetId(), id++);
+        EXPECT_TRUE(b->GetBitmapLabel().IsOk());  // the images of the build's data directory
+    }
+    EXPECT_EQ(p->m_btnSwitch->GetPosition(), wxPoint(750, 530));
+    EXPECT_EQ(p->m_playState, 2);
+    EXPECT_EQ(p->m_currentRecord, -1);
+    EXPECT_EQ(p->GetTitle(), "MorvanePlugin");
+    EXPECT_EQ(p->GetBitmapBaseName(), "MorvanePlugin");
+}
+
+TEST_F(PanelTest, UpTo600PixelsHighTheLayoutIsFixed)
+{
+    MorvanePlugConfig* p = OpenPanel();
+    Resize(p, 1600, 600);
+    EXPECT_EQ(Bounds(p->m_recordList), wxRect(10, 70, 180, 490));
+    EXPECT_EQ(Bounds(p->m_glPane), wxRect(200, 10, 585, 500));
+    EXPECT_EQ(Bounds(p->m_btnPlay), wxRect(395, 530, 30, 30));
+    EXPECT_EQ(Bounds(p->m_btnForward), wxRect(555, 530, 30, 30));
+    EXPECT_EQ(Bounds(p->m_btnSwitch), wxRect(750, 530, 30, 30));
+}
+
+TEST_F(PanelTest, Above600PixelsTheButtonRowFollowsTheCanvasWidth)
+{
+    MorvanePlugConfig* p = OpenPanel();
+    Resize(p, 1024, 768);
+    EXPECT_EQ(Bounds(p->m_recordList), wxRect(10, 70, 180, 658));
+    EXPECT_EQ(Bounds(p->m_glPane), wxRect(200, 10, 809, 668));
+    EXPECT_EQ(p->m_glPane->getWidth(), 809);
+    std::vector<int> xs;
+    for (wxBitmapButton* b : {p->m_btnPlay, p->m_btnPause, p->m_btnStop, p->m_btnReverse, p->m_btnForward}) {
+        xs.push_back(b->GetPosition().x);
+        EXPECT_EQ(b->GetPosition().y, 698);
+    }
+    EXPECT_EQ(xs, (std::vector<int>{485, 535, 586, 636, 687}));
+    EXPECT_EQ(p->m_btnSwitch->GetPosition(), wxPoint(750, 530));
+
+    Resize(p, 1024, 601);
+    EXPECT_EQ(Bounds(p->m_glPane), wxRect(200, 10, 809, 501));
+    EXPECT_EQ(p->m_btnPlay->GetPosition(), wxPoint(384 + 101, 531));
+}
+
+TEST_F(PanelTest, NarrowDialogKeepsACanvasOfAtLeastOnePixel)
+{
+    MorvanePlugConfig* p = OpenPanel();
+    Resize(p, 100, 700);
+    EXPECT_EQ(p->m_glPane->GetSize(), wxSize(1, 600));
+    Resize(p, 215, 601);
+    EXPECT_EQ(p->m_glPane->GetSize().x, 1);
+}
+
+TEST_F(PanelTest, RealResizeOfTheDialogLaysItOut)
+{
+    MorvanePlugConfig* p = OpenPanel();
+    p->m_dialog->SetSize(1024, 768);
+    gui::Pump(100);
+    EXPECT_EQ(p->m_glPane->GetSize(), wxSize(1024 - 215, 768 - 100));
+    EXPECT_EQ(p->m_btnSwitch->GetPosition(), wxPoint(750, 530));
+}
+
+TEST_F(PanelTest, ClosingBeforePlaybackHidesTheDialogAndClosesAll)
+{
+    MorvanePlugConfig* p = OpenPanel();
+    p->m_dialog->Close();
+    gui::Pump();
+    EXPECT_FALSE(p->m_dialog->IsShown());
+    EXPECT_EQ(p->m_glPane, nullptr);
+    EXPECT_TRUE(Events(iEVT_REMOTE_DISCONNECTED).empty());
+    EXPECT_EQ(Events(QRIX_CLOSE_ALL).size(), 1u);
+    // A tick after the close finds no canvas.
+    QrixEvent tick(iEVT_TIMER_UPDATED);
+    EventManager::Get()->ProcessEvent(tick);
+    EXPECT_EQ(panel(), p);  // the panel stays until the plugin deletes it
+}
+
+TEST_F(PanelTest, OpeningTwiceLeavesOnePanelAndDestroysTheFirstDialog)
+{
+    MorvanePlugConfig* first = OpenPanel();
+    wxDialog* firstDialog = first->m_dialog;
+    MorvanePlugConfig* second = OpenPanel();
+    gui::Pump(50);
+    EXPECT_NE(second->m_dialog, firstDialog);
+    EXPECT_FALSE(IsTopLevel(firstDialog));
+    EXPECT_TRUE(IsTopLevel(second->m_dialog));
+    EXPECT_TRUE(Events(QRIX_CLOSE_ALL).empty());  // deletion is no close
+}
+
+TEST_F(PanelTest, ReleaseThenDestructionDeletesThePanelOnce)
+{
+    OpenPanel();
+    plugin_->OnRelease(false);
+    EXPECT_EQ(panel(), nullptr);
+    plugin_->OnRelease(false);
+    delete plugin_;
+    plugin_ = nullptr;
+    EXPECT_EQ(EventManager::Get()->SinkCount(iEVT_TIMER_UPDATED), 0u);
+}
+
+TEST_F(PanelTest, TimerTickRefreshesTheCanvasOnlyOfAShownPanel)
+{
+    MorvanePlugConfig* p = OpenPanel();
+    QrixEvent tick(iEVT_TIMER_UPDATED);
+    EventManager::Get()->ProcessEvent(tick);
+    EXPECT_EQ(p->m_glPane->TextureUpdates(), 1);
+    p->Hide();
+    EventManager::Get()->ProcessEvent(tick);
+    EXPECT_EQ(p->m_glPane->TextureUpdates(), 1);
+    plugin_->OnRelease(false);
+    EventManager::Get()->ProcessEvent(tick);  // no panel: nothing to refresh
+}
+
+TEST_F(PanelTest, CanvasPaintsThroughThePanel)
+{
+    MorvanePlugConfig* p = OpenPanel();
+    const int before = p->m_glPane->Renders();
+    p->m_glPane->Refresh();
+    p->m_glPane->Update();
+    gui::Pump(100);
+    EXPECT_GT(p->m_glPane->Renders(), before);
+}
+
+}  // namespace

@@ -1,0 +1,146 @@
+// The recording list: its rows in local time, its consumed events, and the
+// activation of a row.
+#include <cstdlib>
+#include <ctime>
+
+#include "tests/gui/panel_fixture.h"
+
+namespace {
+
+class TimeZone {
+public:
+    explicit TimeZone(const char* zone)
+    {
+        const char* old = std::getenv("TZ");
+        hadOld_ = old != nullptr;
+        if (old)
+            old_ = old;
+        ::setenv("TZ", zone, 1);
+        ::tzset();
+    }
+    ~TimeZone()
+    {
+        if (hadOld_)
+            ::setenv("TZ", old_.c_str(), 1);
+        else
+            ::unsetenv("TZ");
+        ::tzset();
+    }
+
+private:
+    bool hadOld_ = false;
+    std::string old_;
+};
+
+std::vector<std::vector<wxString>> Rows(CPlugListCtrl* list)
+{
+    std::vector<std::vector<wxString>> rows;
+    for (long i = 0; i < list->GetItemCount(); ++i)
+        rows.push_back({list->GetItemText(i, 0), list->GetItemText(i, 1), list->GetItemText(i, 2)});
+    return rows;
+}
+
+TEST_F(PanelTest, RowsShowLocalTimesInTheWorkstationsZone)
+{
+    // 1970-01-01 23:59:50 to 1970-01-02 00:00:10 UTC, and a day in 2023.
+    WriteDisk(0, {{86390, 86410}, {1700000000, 1700003600}, {0, 10}});
+    {
+        TimeZone utc("UTC");
+        MorvanePlugConfig* p = OpenPanel();
+        p->SendHddList(0);
+        EXPECT_EQ(Rows(p->m_recordList), (std::vector<std::vector<wxString>>{
+                                              {"0.", "1970/01/01 23:59:50", "1970/01/02 00:00:10"},
+                                              {"1.", "2023/11/14 22:13:20", "2023/11/14 23:13:20"},
+                                              {"2.", "1970/01/01 00:00:00", "1970/01/01 00:00:10"}}));
+        EXPECT_EQ(p->m_recordList->GetItemData(1), 1700000000);
+        EXPECT_TRUE(p->m_recordList->IsShown());
+    }
+    {
+        TimeZone tokyo("JST-9");
+        MorvanePlugConfig* p = OpenPanel();
+        p->SendHddList(0);
+        EXPECT_EQ(Rows(p->m_recordList)[1],
+                  (std::vector<wxString>{"1.", "2023/11/15 07:13:20", "2023/11/15 08:13:20"}));
+        EXPECT_STREQ(p->m_catalog->Entries[1].TimeText, "22:13:20-23:13:20");  // the catalogue stays in UTC
+    }
+}
+
+TEST_F(PanelTest, ADiskThatFailsLeavesThePreviousRowsAndAnEmptyCatalogueEmptiesThem)
+{
+    WriteDisk(0, {{100, 200}, {300, 400}});
+    WriteNonDisk(1);
+    WriteDisk(2, {});
+    MorvanePlugConfig* p = OpenPanel();
+    p->SendHddList(0);
+    ASSERT_EQ(p->m_recordList->GetItemCount(), 2);
+    p->SendHddList(1);
+    EXPECT_EQ(p->m_recordList->GetItemCount(), 2);
+    EXPECT_EQ(p->m_diskPath, wxString(dir_ + "/disk1.img"));
+    p->SendHddList(2);
+    EXPECT_EQ(p->m_recordList->GetItemCount(), 0);
+    EXPECT_TRUE(p->m_recordList->IsShown());
+}
+
+TEST_F(PanelTest, ListEventsStopAtTheListControl)
+{
+    MorvanePlugConfig* p = OpenPanel();
+    int reachedDialog = 0;
+    auto count = [&reachedDialog](wxListEvent& event) {
+        ++reachedDialog;
+        event.Skip();
+    };
+    const wxEventType consumed[] = {
+        wxEVT_LIST_BEGIN_DRAG,    wxEVT_LIST_BEGIN_RDRAG,      wxEVT_LIST_BEGIN_LABEL_EDIT, wxEVT_LIST_END_LABEL_EDIT,
+        wxEVT_LIST_DELETE_ITEM,   wxEVT_LIST_DELETE_ALL_ITEMS, wxEVT_LIST_ITEM_SELECTED,    wxEVT_LIST_ITEM_DESELECTED,
+        wxEVT_LIST_KEY_DOWN,      wxEVT_LIST_ITEM_FOCUSED,     wxEVT_LIST_COL_CLICK,        wxEVT_LIST_COL_RIGHT_CLICK,
+        wxEVT_LIST_COL_BEGIN_DRAG, wxEVT_LIST_COL_DRAGGING,    wxEVT_LIST_COL_END_DRAG,     wxEVT_LIST_CACHE_HINT,
+    };
+    for (wxEventType type : consumed)
+        p->m_dialog->Bind(wxEventTypeTag<wxListEvent>(type), count);
+    for (wxEventType type : consumed) {
+        wxListEvent event(type, p->m_recordList->GetId());
+        event.SetEventObject(p->m_recordList);
+        p->m_recordList->GetEventHandler()->ProcessEvent(event);
+    }
+    wxMouseEvent right(wxEVT_RIGHT_DOWN);
+    EXPECT_TRUE(p->m_recordList->GetEventHandler()->ProcessEvent(right));
+    EXPECT_EQ(reachedDialog, 0);
+    EXPECT_TRUE(EventManager::Get()->History().empty());
+}
+
+TEST_F(PanelTest, ActivatingARowPlaysThatRowOnce)
+{
+    WriteDisk(0, {{100, 200}, {300, 400}, {500, 600}});
+    MorvanePlugConfig* p = OpenPanel();
+    p->SendHddList(0);
+    wxListEvent activate(wxEVT_LIST_ITEM_ACTIVATED, p->m_recordList->GetId());
+    activate.SetEventObject(p->m_recordList);
+    activate.m_itemIndex = 2;
+    p->m_recordList->GetEventHandler()->ProcessEvent(activate);
+
+    const std::vector<HostEventRecord> connects = Events(iEVT_HDD_CONNECTED);
+    ASSERT_EQ(connects.size(), 1u);
+    EXPECT_EQ(connects[0].record, 2u);
+    EXPECT_EQ(connects[0].address, "127.0.0.1");
+    EXPECT_EQ(connects[0].path, wxString(dir_ + "/disk0.img"));
+    EXPECT_EQ(connects[0].panelId, p->m_panelId);
+    EXPECT_EQ(p->m_currentRecord, 2);
+    EXPECT_EQ(p->m_playState, 0);
+}
+
+TEST_F(PanelTest, PlayingOutsideTheCatalogueDoesNothing)
+{
+    MorvanePlugConfig* p = OpenPanel();
+    p->SendMorvaneCommand(0);  // no catalogue yet
+    WriteDisk(0, {{100, 200}});
+    p->SendHddList(0);
+    p->SendMorvaneCommand(-1);
+    p->SendMorvaneCommand(8192);
+    EXPECT_TRUE(Events(iEVT_HDD_CONNECTED).empty());
+    EXPECT_EQ(p->m_currentRecord, -1);
+    p->SendMorvaneCommand(8191);  // a slot of the catalogue that this build did not fill
+    ASSERT_EQ(Events(iEVT_HDD_CONNECTED).size(), 1u);
+    EXPECT_EQ(Events(iEVT_HDD_CONNECTED)[0].record, 65535u);
+}
+
+}  // namespace
