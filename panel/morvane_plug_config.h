@@ -90,9 +90,28 @@ private:
     // of the connection record (0 when nothing played).
     unsigned int StopPlayback();
     // Sends a disconnect of the current connection, stops and forgets the
-    // decoder (a decoder that ended by itself is only forgotten).
+    // decoder.
     void TakeDownDecoder(int eventId);
+    // Detaches the decoder from the canvas, stops it and lets it go; a decoder
+    // that ended by itself is only forgotten.
+    void ReleaseDecoder();
+    void DeleteCanvas();
     void SendFileEvent(int type, int id, int mode, int command);
+    // Sends a host command without data (close all, start file play).
+    void SendHostCommand(int type);
+    // The connection record and the panel identifier, as every event about
+    // the current playback carries them.
+    template <class Event>
+    void FillFromConnection(Event& event) const
+    {
+        event.text1 = m_connText1;
+        event.text2 = m_connText2;
+        event.address = m_connAddress;
+        event.record = m_connRecord;
+        event.path = m_connPath;
+        event.channelCount = 0;
+        event.panelId = m_panelId;
+    }
 
     wxDECLARE_EVENT_TABLE();
 };

@@ -10,25 +10,37 @@ unsigned int MorvanePlugConfig::StopPlayback()
     StringIPtoUint32(m_connAddress, address);
     if (m_decoder) {
         if (IsGoodIP(address, false)) {
-            disconnect.text1 = m_connText1;
-            disconnect.text2 = m_connText2;
-            disconnect.address = m_connAddress;
-            disconnect.record = m_connRecord;
-            disconnect.path = m_connPath;
-            disconnect.channelCount = 0;
-            disconnect.panelId = m_panelId;
+            FillFromConnection(disconnect);
             EventManager::Get()->ProcessEvent(disconnect);
         }
-        // Detached from the canvas before it is asked to stop, so that it no
-        // longer draws when the canvas goes.
-        if (m_decoder->IsAlive()) {
-            m_decoder->SetCanvas(nullptr);
-            m_decoder->StopDecoder();
-            m_decoder->Delete(nullptr);
-        }
-        m_decoder = nullptr;
+        ReleaseDecoder();
     }
     return address;
+}
+
+void MorvanePlugConfig::ReleaseDecoder()
+{
+    // Detached from the canvas before it is asked to stop, so that it no
+    // longer draws when the canvas goes.
+    if (m_decoder->IsAlive()) {
+        m_decoder->SetCanvas(nullptr);
+        m_decoder->StopDecoder();
+        m_decoder->Delete(nullptr);
+    }
+    m_decoder = nullptr;
+}
+
+void MorvanePlugConfig::DeleteCanvas()
+{
+    delete m_glPane;
+    m_glPane = nullptr;
+}
+
+void MorvanePlugConfig::SendHostCommand(int type)
+{
+    auto* command = new QrixEvent(type, 0);
+    EventManager::Get()->ProcessEvent(*command);
+    delete command;
 }
 
 void MorvanePlugConfig::OnCloseWindow(wxCloseEvent&)
@@ -36,12 +48,9 @@ void MorvanePlugConfig::OnCloseWindow(wxCloseEvent&)
     const unsigned int address = StopPlayback();
     if (address != 0 && m_glPane)
         m_glPane->SetOffAllChannels(address, m_channelCount, 3);
-    delete m_glPane;
-    m_glPane = nullptr;
+    DeleteCanvas();
     m_dialog->Show(false);
-    auto* closeAll = new QrixEvent(QRIX_CLOSE_ALL, 0);
-    EventManager::Get()->ProcessEvent(*closeAll);
-    delete closeAll;
+    SendHostCommand(QRIX_CLOSE_ALL);
 }
 
 MorvanePlugConfig::~MorvanePlugConfig()
@@ -52,8 +61,7 @@ MorvanePlugConfig::~MorvanePlugConfig()
         if (dvr && m_glPane)
             m_glPane->SetOffAllChannels(address, dvr->channelCount, 3);
     }
-    delete m_glPane;
-    m_glPane = nullptr;
+    DeleteCanvas();
     CloseDVRFS();
     delete m_catalog;
     m_catalog = nullptr;

@@ -15,27 +15,16 @@ constexpr int kMaxChannels = 32;
 void MorvanePlugConfig::SendFileEvent(int type, int id, int mode, int command)
 {
     QrixFileEvent event(type, id);
-    event.text1 = m_connText1;
-    event.text2 = m_connText2;
-    event.address = m_connAddress;
-    event.record = m_connRecord;
-    event.path = m_connPath;
-    event.channelCount = 0;
+    FillFromConnection(event);
     event.mode = mode;
     event.command = command;
-    event.panelId = m_panelId;
     EventManager::Get()->ProcessEvent(event);
 }
 
 void MorvanePlugConfig::TakeDownDecoder(int eventId)
 {
     SendFileEvent(iEVT_HDD_DISCONNECTED, eventId, 0, 0);
-    if (m_decoder->IsAlive()) {
-        m_decoder->SetCanvas(nullptr);
-        m_decoder->StopDecoder();
-        m_decoder->Delete(nullptr);
-    }
-    m_decoder = nullptr;
+    ReleaseDecoder();
 }
 
 void MorvanePlugConfig::SendMorvaneCommand(int index)

@@ -66,10 +66,7 @@ void MorvanePlugConfig::OnSwitchToFilePlay(wxCommandEvent&)
         TakeDownDecoder(0);
     if (oldAddress != 0 && m_channelCount > 0 && m_glPane)
         m_glPane->SetOffAllChannels(oldAddress, m_channelCount, 3);
-    delete m_glPane;
-    m_glPane = nullptr;
+    DeleteCanvas();
     m_dialog->Show(false);
-    auto* startFilePlay = new QrixEvent(QRIX_START_FILEPLAY, 0);
-    EventManager::Get()->ProcessEvent(*startFilePlay);
-    delete startFilePlay;
+    SendHostCommand(QRIX_START_FILEPLAY);
 }
