@@ -1,7 +1,164 @@
-// The host's decoder thread for the channels of one DVR.
+// The host's decoder thread for a disk playback: it opens the disk with its
+// own read-only handle, reads the recording's frames with the reader's
+// stream extraction, decodes them with libavcodec and hands the newest
+// picture to its canvas, paced by the speed of the latest transport command.
+#include <algorithm>
 #include <chrono>
+#include <cstdlib>
+#include <memory>
+#include <vector>
 
+#include "catalog/catalog_reader.h"
+#include "host/h264_decoder.h"
+#include "host/playback_control.h"
 #include "host/sdk_video.h"
+
+namespace {
+
+constexpr int kFrameMilliseconds = 40;  // the recorders write 25 frames a second
+constexpr int kIdleMilliseconds = 20;
+
+// How long a frame stays on screen at a speed (1024 = normal).
+int FrameInterval(int speed, int frames)
+{
+    const long long interval = static_cast<long long>(kFrameMilliseconds) * frames * PlaybackControl::kNormalSpeed /
+                               std::max(1, std::abs(speed));
+    return static_cast<int>(std::clamp<long long>(interval, 1, 10000));
+}
+
+}  // namespace
+
+// The playback itself, run by the decoder thread.
+class DecoderLoop {
+public:
+    DecoderLoop(ChannelDecoder& thread, long long dvrId) : m_thread(thread), m_dvrId(dvrId) {}
+
+    // Opens the disk of the session and places the cursor on the first frame
+    // of its recording; false when there is nothing to play.
+    bool Open(const PlaybackControl::Session& session)
+    {
+        if (m_reader.OpenDVRFS(session.path) <= 0 || m_reader.Checkconfig() <= 0 ||
+            (m_reader.BlockOpe(m_reader.m_diskFile, 2, nullptr, 0, 0) < 0 && !m_reader.m_volume->adapter))
+            return false;
+        const _HisiAdapter_t& adapter = *m_reader.m_volume->adapter;
+        if (adapter.ListMax <= 0 || adapter.DataBlockMax <= 0)
+            return false;
+        _HisiList_t recording{};
+        if (m_reader.BlockOpe(m_reader.m_diskFile, 33, &recording, session.record % adapter.ListMax, 1) < 0)
+            return false;
+        m_oldest = adapter.FirstList;
+        m_newest = adapter.LastList;
+        m_reader.m_streamBlock = recording.StartBlock;
+        m_reader.m_streamFrame = 0;
+        m_payload.resize(static_cast<std::size_t>(kPayloadAreaSize));
+        return m_decoder.Ok();
+    }
+
+    // Plays until the decoder is asked to stop or to end.
+    void Run(std::unique_lock<std::mutex>& lock)
+    {
+        while (!m_thread.Stopping()) {
+            const int speed = PlaybackControl::Get()->Speed(m_dvrId);
+            int wait = kIdleMilliseconds;
+            if (speed > 0)
+                wait = StepForward(lock, speed);
+            else if (speed < 0)
+                wait = StepBackward(lock, speed);
+            if (!m_thread.Wait(lock, wait))
+                return;
+        }
+    }
+
+private:
+    int StepForward(std::unique_lock<std::mutex>& lock, int speed)
+    {
+        if (m_lastDirection < 0) {
+            // Back to forward: on from the key frame shown last, which the
+            // decoder still holds.
+            m_reader.m_streamBlock = m_lastBlock;
+            m_reader.m_streamFrame = m_lastEntry + 1;
+        }
+        m_lastDirection = 1;
+        _HisiHeader_t frame{};
+        const int size = m_reader.get_stream(m_reader.m_diskFile, m_payload.data(), &frame, m_oldest, m_newest, 1);
+        if (size < 0) {
+            SkipDamaged(1);
+            return 0;
+        }
+        m_damagedInARow = 0;
+        m_lastBlock = m_reader.m_streamBlock;
+        m_lastEntry = m_reader.m_streamFrame - 1;
+        for (Picture& picture : m_decoder.Decode(m_payload.data(), static_cast<std::size_t>(size), m_lastBlock,
+                                                 m_lastEntry, false))
+            m_thread.Publish(lock, std::move(picture));
+        return FrameInterval(speed, 1);
+    }
+
+    // Backwards the key frames are shown in reverse order, each after the
+    // time the frames between them would take.
+    int StepBackward(std::unique_lock<std::mutex>& lock, int speed)
+    {
+        if (m_lastDirection >= 0) {
+            m_reader.m_streamBlock = m_lastBlock;
+            m_reader.m_streamFrame = m_lastEntry - 1;
+        }
+        m_lastDirection = -1;
+        for (int passed = 1; passed <= kMaxFramesToAKeyFrame; ++passed) {
+            _HisiHeader_t frame{};
+            const int size =
+                m_reader.get_stream(m_reader.m_diskFile, m_payload.data(), &frame, m_oldest, m_newest, 0);
+            if (size < 0) {
+                SkipDamaged(-1);
+                return 0;
+            }
+            m_damagedInARow = 0;
+            m_lastBlock = m_reader.m_streamBlock;
+            m_lastEntry = m_reader.m_streamFrame + 1;
+            if (!H264Decoder::IsKeyFrame(m_payload.data(), static_cast<std::size_t>(size)))
+                continue;
+            m_decoder.Reset();
+            for (Picture& picture : m_decoder.Decode(m_payload.data(), static_cast<std::size_t>(size), m_lastBlock,
+                                                     m_lastEntry, true))
+                m_thread.Publish(lock, std::move(picture));
+            return FrameInterval(speed, passed);
+        }
+        return FrameInterval(speed, kMaxFramesToAKeyFrame);
+    }
+
+    // A block whose header or index cannot be read is passed over, not
+    // retried; a disk where nothing reads any more is left alone.
+    void SkipDamaged(int direction)
+    {
+        if (++m_damagedInARow > m_reader.m_volume->adapter->DataBlockMax + 2) {
+            PlaybackControl::Get()->SetSpeed(m_dvrId, 0);
+            return;
+        }
+        if (direction > 0) {
+            ++m_reader.m_streamBlock;
+            m_reader.m_streamFrame = 0;
+        } else {
+            --m_reader.m_streamBlock;
+            m_reader.m_streamFrame = -1;
+            if (m_reader.m_streamBlock < 0)
+                m_reader.m_streamBlock = m_newest.EndBlock;
+        }
+        m_decoder.Reset();
+    }
+
+    static constexpr int kMaxFramesToAKeyFrame = 600;
+
+    ChannelDecoder& m_thread;
+    long long m_dvrId;
+    CatalogReader m_reader;
+    H264Decoder m_decoder;
+    std::vector<unsigned char> m_payload;
+    _HisiList_t m_oldest{};
+    _HisiList_t m_newest{};
+    long long m_lastBlock = 0;
+    int m_lastEntry = 0;
+    int m_lastDirection = 0;
+    int m_damagedInARow = 0;
+};
 
 ChannelDecoder::ChannelDecoder(wxEvtHandler*)
     : wxThread(wxTHREAD_DETACHED), m_dvrId(0), m_filePath(&m_filePathText)
@@ -40,17 +197,50 @@ void ChannelDecoder::StopDecoder()
     m_changed.wait_for(lock, std::chrono::seconds(2), [this] { return m_idle; });
 }
 
-wxThread::ExitCode ChannelDecoder::Entry()
+bool ChannelDecoder::Stopping()
 {
-    std::unique_lock<std::mutex> lock(m_mutex);
+    return m_stopRequested || TestDestroy();
+}
+
+bool ChannelDecoder::Wait(std::unique_lock<std::mutex>& lock, int milliseconds)
+{
+    if (milliseconds > 0)
+        m_changed.wait_for(lock, std::chrono::milliseconds(milliseconds), [this] { return m_stopRequested; });
+    return !Stopping();
+}
+
+// Under the decoder's lock: once SetCanvas(nullptr) or StopDecoder has
+// returned, no picture reaches the old canvas.
+void ChannelDecoder::Publish(std::unique_lock<std::mutex>&, Picture picture)
+{
+    if (m_canvas)
+        m_canvas->ShowPicture(0, std::move(picture));
+}
+
+// The thread ends only when it is deleted; until then it touches nothing.
+void ChannelDecoder::IdleUntilDeleted(std::unique_lock<std::mutex>& lock)
+{
     while (!TestDestroy()) {
         if (m_stopRequested && !m_idle) {
             m_idle = true;
             m_changed.notify_all();
         }
-        m_changed.wait_for(lock, std::chrono::milliseconds(20));
+        m_changed.wait_for(lock, std::chrono::milliseconds(kIdleMilliseconds));
     }
     m_idle = true;
     m_changed.notify_all();
+}
+
+wxThread::ExitCode ChannelDecoder::Entry()
+{
+    PlaybackControl::Session session;
+    auto loop = std::make_unique<DecoderLoop>(*this, m_dvrId);
+    // The disk is opened outside the lock: a stop request need not wait for it.
+    const bool playable = PlaybackControl::Get()->Find(m_dvrId, &session) && loop->Open(session);
+    std::unique_lock<std::mutex> lock(m_mutex);
+    if (playable)
+        loop->Run(lock);
+    loop.reset();  // closes the disk
+    IdleUntilDeleted(lock);
     return nullptr;
 }

@@ -1,5 +1,9 @@
-// The host's OpenGL canvas: a grid of channel cells on the shared context.
+// The host's OpenGL canvas: a grid of channel cells on the shared context,
+// each showing the newest picture its decoder handed over.
 #include <GL/gl.h>
+
+#include <algorithm>
+#include <vector>
 
 #include <wx/dcclient.h>
 
@@ -27,12 +31,17 @@ void BasicGLPane::OnRender(wxPaintEvent&)
     if (!m_context || !IsShownOnScreen())
         return;
     SetCurrent(*m_context);
+    DrawScene();
+    SwapBuffers();
+}
+
+void BasicGLPane::DrawScene()
+{
     const wxSize size = GetClientSize();
     glViewport(0, 0, size.x, size.y);
     glClearColor(0.06f, 0.06f, 0.08f, 1.0f);
     glClear(GL_COLOR_BUFFER_BIT | GL_DEPTH_BUFFER_BIT);
 
-    // One cell per channel shown, in a square grid.
     int columns = 1;
     while (columns * columns < m_channelsShown)
         ++columns;
@@ -41,19 +50,95 @@ void BasicGLPane::OnRender(wxPaintEvent&)
     glOrtho(0, columns, columns, 0, -1, 1);
     glMatrixMode(GL_MODELVIEW);
     glLoadIdentity();
-    for (int channel = 0; channel < m_channelsShown; ++channel) {
-        const float x = static_cast<float>(channel % columns);
-        const float y = static_cast<float>(channel / columns);
-        glColor3f(0.16f, 0.16f, 0.2f);
-        glBegin(GL_QUADS);
-        glVertex2f(x + 0.02f, y + 0.02f);
-        glVertex2f(x + 0.98f, y + 0.02f);
-        glVertex2f(x + 0.98f, y + 0.98f);
-        glVertex2f(x + 0.02f, y + 0.98f);
-        glEnd();
-    }
+    for (int channel = 0; channel < m_channelsShown && channel < kMaxChannels; ++channel)
+        DrawCell(channel, columns);
     glFlush();
-    SwapBuffers();
+}
+
+// One cell of the square grid: the channel's picture, or an empty frame.
+void BasicGLPane::DrawCell(int channel, int columns)
+{
+    const float x = static_cast<float>(channel % columns);
+    const float y = static_cast<float>(channel / columns);
+    const float inset = columns > 1 ? 0.01f : 0.0f;
+    if (m_hasTexture[channel]) {
+        glEnable(GL_TEXTURE_2D);
+        glBindTexture(GL_TEXTURE_2D, m_textures[channel]);
+        glColor3f(1, 1, 1);
+    } else {
+        glDisable(GL_TEXTURE_2D);
+        glColor3f(0.16f, 0.16f, 0.2f);
+    }
+    glBegin(GL_QUADS);
+    glTexCoord2f(0, 0);
+    glVertex2f(x + inset, y + inset);
+    glTexCoord2f(1, 0);
+    glVertex2f(x + 1 - inset, y + inset);
+    glTexCoord2f(1, 1);
+    glVertex2f(x + 1 - inset, y + 1 - inset);
+    glTexCoord2f(0, 1);
+    glVertex2f(x + inset, y + 1 - inset);
+    glEnd();
+    glDisable(GL_TEXTURE_2D);
+}
+
+void BasicGLPane::ShowPicture(int channel, Picture picture)
+{
+    if (channel < 0 || channel >= kMaxChannels)
+        return;
+    std::lock_guard<std::mutex> lock(m_pictureMutex);
+    ++m_picturesReceived;
+    m_last.width = picture.width;
+    m_last.height = picture.height;
+    m_last.block = picture.block;
+    m_last.entry = picture.entry;
+    m_last.key = picture.key;
+    m_newest[channel] = std::move(picture);
+    m_fresh[channel] = true;
+}
+
+int BasicGLPane::PicturesReceived() const
+{
+    std::lock_guard<std::mutex> lock(m_pictureMutex);
+    return m_picturesReceived;
+}
+
+Picture BasicGLPane::LastPicture() const
+{
+    std::lock_guard<std::mutex> lock(m_pictureMutex);
+    return m_last;
+}
+
+void BasicGLPane::UploadNewestPictures()
+{
+    Picture pictures[kMaxChannels];
+    bool any = false;
+    {
+        std::lock_guard<std::mutex> lock(m_pictureMutex);
+        for (int c = 0; c < kMaxChannels; ++c) {
+            if (m_fresh[c]) {
+                pictures[c] = std::move(m_newest[c]);
+                m_fresh[c] = false;
+                any = true;
+            }
+        }
+    }
+    if (!any || !m_context || !IsShownOnScreen())
+        return;
+    SetCurrent(*m_context);
+    glPixelStorei(GL_UNPACK_ALIGNMENT, 1);
+    for (int c = 0; c < kMaxChannels; ++c) {
+        if (pictures[c].rgb.empty())
+            continue;
+        if (!m_hasTexture[c])
+            glGenTextures(1, &m_textures[c]);
+        glBindTexture(GL_TEXTURE_2D, m_textures[c]);
+        glTexParameteri(GL_TEXTURE_2D, GL_TEXTURE_MIN_FILTER, GL_LINEAR);
+        glTexParameteri(GL_TEXTURE_2D, GL_TEXTURE_MAG_FILTER, GL_LINEAR);
+        glTexImage2D(GL_TEXTURE_2D, 0, GL_RGB, pictures[c].width, pictures[c].height, 0, GL_RGB, GL_UNSIGNED_BYTE,
+                     pictures[c].rgb.data());
+        m_hasTexture[c] = true;
+    }
 }
 
 void BasicGLPane::ProcessTexture(int operation, _TEXTURE_DATA*)
@@ -61,6 +146,7 @@ void BasicGLPane::ProcessTexture(int operation, _TEXTURE_DATA*)
     if (operation != 2)
         return;
     ++m_textureUpdates;
+    UploadNewestPictures();
     Refresh(false);
 }
 
@@ -74,7 +160,7 @@ void BasicGLPane::Reset(int channel, int type)
 void BasicGLPane::SetOnAllChannels(unsigned long long address, int channelCount, int type)
 {
     m_calls.push_back({Call::kOn, address, channelCount, type});
-    m_channelsShown = channelCount;
+    m_channelsShown = std::min(channelCount, static_cast<int>(kMaxChannels));
     Refresh(false);
 }
 
@@ -83,6 +169,25 @@ void BasicGLPane::SetOffAllChannels(unsigned long long address, int channelCount
     m_calls.push_back({Call::kOff, address, channelCount, type});
     m_channelsShown = 0;
     Refresh(false);
+}
+
+wxImage BasicGLPane::Snapshot()
+{
+    if (!m_context || !IsShownOnScreen())
+        return wxImage();
+    SetCurrent(*m_context);
+    DrawScene();  // into the back buffer, which is not shown until a swap
+    const wxSize size = GetClientSize();
+    std::vector<unsigned char> rows(static_cast<std::size_t>(size.x) * size.y * 3);
+    glReadBuffer(GL_BACK);
+    glPixelStorei(GL_PACK_ALIGNMENT, 1);
+    glReadPixels(0, 0, size.x, size.y, GL_RGB, GL_UNSIGNED_BYTE, rows.data());
+    wxImage image(size.x, size.y);
+    // OpenGL counts rows from the bottom.
+    for (int y = 0; y < size.y; ++y)
+        std::copy_n(rows.data() + static_cast<std::size_t>(size.y - 1 - y) * size.x * 3, size.x * 3,
+                    image.GetData() + static_cast<std::size_t>(y) * size.x * 3);
+    return image;
 }
 
 int BasicGLPane::getWidth()

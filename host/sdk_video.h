@@ -9,8 +9,10 @@
 #include <vector>
 
 #include <wx/glcanvas.h>
+#include <wx/image.h>
 #include <wx/thread.h>
 
+#include "host/picture.h"
 #include "host/sdk_api.h"
 #include "host/sdk_services.h"
 
@@ -30,6 +32,15 @@ public:
     void SetOffAllChannels(unsigned long long address, int channelCount, int type);
     int getWidth();
 
+    // Host side: a decoder hands the newest picture of a channel, from any
+    // thread; the next ProcessTexture shows it.
+    void ShowPicture(int channel, Picture picture);
+    int PicturesReceived() const;
+    Picture LastPicture() const;
+    // What the canvas shows now: its scene drawn once more and read back
+    // from OpenGL (empty when it cannot draw).
+    wxImage Snapshot();
+
     // What the canvas was asked to do, for whoever watches the host.
     struct Call {
         enum Kind { kReset, kOn, kOff } kind;
@@ -43,7 +54,19 @@ public:
     int ChannelsShown() const { return m_channelsShown; }
 
 private:
+    static constexpr int kMaxChannels = 32;
+    void UploadNewestPictures();
+    void DrawScene();
+    void DrawCell(int channel, int columns);
+
     wxGLContext* m_context;
+    mutable std::mutex m_pictureMutex;
+    Picture m_newest[kMaxChannels];
+    bool m_fresh[kMaxChannels] = {};
+    int m_picturesReceived = 0;
+    Picture m_last;
+    unsigned int m_textures[kMaxChannels] = {};
+    bool m_hasTexture[kMaxChannels] = {};
     std::vector<Call> m_calls;
     int m_textureUpdates = 0;
     int m_renders = 0;
@@ -68,6 +91,15 @@ public:
 
 protected:
     ExitCode Entry() override;
+
+private:
+    friend class DecoderLoop;
+    // Waits on the decoder's lock for `milliseconds` or until woken; false
+    // once the decoder is asked to stop or to end.
+    bool Wait(std::unique_lock<std::mutex>& lock, int milliseconds);
+    bool Stopping();
+    void Publish(std::unique_lock<std::mutex>& lock, Picture picture);
+    void IdleUntilDeleted(std::unique_lock<std::mutex>& lock);
 
     std::mutex m_mutex;
     std::condition_variable m_changed;

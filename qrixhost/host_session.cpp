@@ -1,5 +1,7 @@
 #include "qrixhost/host_session.h"
 
+#include "qrixhost/file_player.h"
+
 #include <wx/app.h>
 #include <wx/menu.h>
 #include <wx/msgdlg.h>
@@ -87,6 +89,7 @@ void HostSession::OnClose(wxCloseEvent& event)
 {
     m_tick.Stop();
     ReleasePlugin();
+    FilePlayer::CloseAll();
     FrameManager::Get()->Shutdown();  // its hidden window would keep the application running
     event.Skip();
 }
@@ -94,23 +97,4 @@ void HostSession::OnClose(wxCloseEvent& event)
 void HostSession::ReleasePlugin()
 {
     m_plugins.Unload();
-}
-
-namespace {
-
-void AnswerDiskPlayback(QrixFileEvent& event)
-{
-    if (event.GetEventType() == iEVT_HDD_CONNECTED) {
-        unsigned int address = 0;
-        StringIPtoUint32(event.address, address);
-        DvrManager::Get()->Register(address, 1, event.panelId);
-        event.channelCount = 1;
-    }
-}
-
-}  // namespace
-
-void InstallDiskPlaybackService()
-{
-    EventManager::Get()->SetFileEventHandler(AnswerDiskPlayback);
 }

@@ -8,6 +8,7 @@
 #include <wx/frame.h>
 #include <wx/timer.h>
 
+#include "qrixhost/disk_playback_service.h"
 #include "qrixhost/plugin_host.h"
 
 class HostSession : public wxFrame {
@@ -39,9 +40,5 @@ private:
     CPlugToolBar* m_toolBar = nullptr;
     wxTimer m_tick;
 };
-
-// The host's own answers to disk playback events: a connect is answered
-// with the channel count of the disk's pseudo DVR.
-void InstallDiskPlaybackService();
 
 #endif

@@ -5,7 +5,11 @@
 #include <unistd.h>
 
 #include <cstdlib>
+#include <cstring>
+#include <set>
 #include <filesystem>
+#include <fstream>
+#include <iterator>
 
 #include <wx/combo.h>
 #include <wx/dcmemory.h>
@@ -42,14 +46,34 @@ protected:
         std::filesystem::remove_all(dir_);
     }
 
+    // The sample clip, one second (25 frames, one key frame) per data block.
     static void WriteSampleDisk(const std::string& path)
     {
+        std::ifstream in(MORVANE_SOURCE_DIR "/samples/clip.h264", std::ios::binary);
+        const std::vector<std::uint8_t> clip((std::istreambuf_iterator<char>(in)), std::istreambuf_iterator<char>());
+        const std::vector<std::vector<std::uint8_t>> frames = dvrimage::SplitAccessUnits(clip);
         dvrimage::Layout layout;
         layout.dataBlockMax = 16;
         dvrimage::DiskImage image(layout);
-        image.Add(dvrimage::GeneratedRecording(0, 2, 4, 1700000000, 1700003600, 16));
-        image.Add(dvrimage::GeneratedRecording(1, 5, 9, 1700007200, 1700010800, 16));
-        image.Add(dvrimage::GeneratedRecording(2, 12, 1, 1700014400, 1700021600, 16));
+        std::size_t next = 0;
+        auto recording = [&](int idx, int start, int end, std::uint32_t t0) {
+            dvrimage::Recording r;
+            r.listIdx = idx;
+            r.startBlock = start;
+            r.endBlock = end;
+            r.startTime = t0;
+            r.endTime = t0 + 3600;
+            const int blocks = end >= start ? end - start + 1 : end + 16 - start + 1;
+            for (int b = 0; b < blocks; ++b) {
+                r.blocks.emplace_back();
+                for (int k = 0; k < 25; ++k, next = (next + 1) % frames.size())
+                    r.blocks.back().push_back(dvrimage::Frame{frames[next], 1});
+            }
+            image.Add(r);
+        };
+        recording(0, 2, 4, 1700000000);
+        recording(1, 5, 9, 1700007200);
+        recording(2, 12, 1, 1700014400);
         image.Write(path);
     }
 
@@ -111,6 +135,101 @@ TEST_F(HostSessionTest, ToolbarOpensThePanelAndAChosenDriveListsItsRecordings)
     EXPECT_EQ(combo->GetValue(), "PHYSICALDRIVE0");
     if (const char* shot = std::getenv("MORVANE_SCREENSHOT"))
         SaveScreenshot(list->GetParent(), shot);
+}
+
+// The pictures of the canvas region of the screen differ from one another
+// and are not one flat colour.
+class ScreenWatch {
+public:
+    explicit ScreenWatch(wxWindow* window) : m_window(window) {}
+    wxImage Take() const
+    {
+        const wxRect area = m_window->GetScreenRect();
+        wxScreenDC screen;
+        wxBitmap shot(area.width, area.height, 24);
+        wxMemoryDC copy(shot);
+        copy.Blit(0, 0, area.width, area.height, &screen, area.x, area.y);
+        copy.SelectObject(wxNullBitmap);
+        return shot.ConvertToImage();
+    }
+    static int Colours(const wxImage& image)
+    {
+        std::set<unsigned> colours;
+        const unsigned char* p = image.GetData();
+        for (int i = 0; i < image.GetWidth() * image.GetHeight(); i += 7)
+            colours.insert(p[3 * i] << 16 | p[3 * i + 1] << 8 | p[3 * i + 2]);
+        return static_cast<int>(colours.size());
+    }
+
+private:
+    wxWindow* m_window;
+};
+
+TEST_F(HostSessionTest, ActivatedRowPlaysInTheCanvasAndTheTransportCommandsReachTheHost)
+{
+    ASSERT_TRUE(session_->PluginLoaded()) << session_->Error();
+    session_->plugins().plugin()->Configure();
+    gui::Pump(200);
+    auto* list = dynamic_cast<wxListCtrl*>(wxWindow::FindWindowById(1012));
+    ASSERT_NE(list, nullptr);
+    wxWindow* dialog = list->GetParent();
+    BasicGLPane* canvas = nullptr;
+    for (wxWindow* child : dialog->GetChildren())
+        if (auto* pane = dynamic_cast<BasicGLPane*>(child))
+            canvas = pane;
+    ASSERT_NE(canvas, nullptr);
+
+    // Choose the drive through the selector, then double-click row 1.
+    auto* combo = dynamic_cast<wxComboCtrl*>(wxWindow::FindWindowById(1011));
+    combo->Popup();
+    gui::Pump(200);
+    auto* tree = dynamic_cast<wxTreeCtrl*>(combo->GetPopupControl()->GetControl());
+    wxTreeItemIdValue cookie;
+    wxRect label;
+    ASSERT_TRUE(tree->GetBoundingRect(tree->GetFirstChild(tree->GetRootItem(), cookie), label, true));
+    ClickAt(tree, label.GetPosition() + label.GetSize() / 2);
+    ASSERT_EQ(list->GetItemCount(), 3);
+    wxRect row;
+    ASSERT_TRUE(list->GetItemRect(1, row));
+    wxUIActionSimulator mouse;
+    mouse.MouseMove(list->ClientToScreen(row.GetPosition() + wxPoint(20, row.height / 2)));
+    gui::Pump(100);
+    mouse.MouseDblClick();
+    gui::Pump(1500);
+
+    const Picture first = canvas->LastPicture();
+    const int received = canvas->PicturesReceived();
+    EXPECT_GT(received, 10) << "no pictures reached the canvas";
+    EXPECT_EQ(first.width, 320);
+    const wxImage shotA = canvas->Snapshot();
+    gui::Pump(1300);  // the clip's counter turns every second
+    const wxImage shotB = canvas->Snapshot();
+    ASSERT_TRUE(shotA.IsOk() && shotB.IsOk());
+    EXPECT_GT(canvas->PicturesReceived(), received);
+    EXPECT_GT(ScreenWatch::Colours(shotA), 8) << "the canvas is blank";
+    EXPECT_NE(0, memcmp(shotA.GetData(), shotB.GetData(), shotA.GetWidth() * shotA.GetHeight() * 3))
+        << "the picture does not change";
+    if (const char* shot = std::getenv("MORVANE_PLAYING_SCREENSHOT"))
+        ScreenWatch(dialog).Take().SaveFile(shot, wxBITMAP_TYPE_PNG);
+
+    // Every transport button, pressed for real.
+    const std::vector<std::pair<int, int>> buttons = {{1029, 0}, {1028, 1024}, {1032, 2048}, {1031, -1024}};
+    for (const auto& [id, speed] : buttons) {
+        wxWindow* button = wxWindow::FindWindowById(id, dialog);
+        ASSERT_NE(button, nullptr);
+        ClickAt(button, wxPoint(15, 15));
+        std::vector<int> commands;
+        for (const HostEventRecord& r : EventManager::Get()->History())
+            if (r.type == iEVT_HDD_COMMAND)
+                commands.push_back(r.command);
+        ASSERT_FALSE(commands.empty());
+        EXPECT_EQ(commands.back(), speed) << "button " << id;
+    }
+    ClickAt(wxWindow::FindWindowById(1030, dialog), wxPoint(15, 15));  // stop
+    EXPECT_EQ(EventManager::Get()->History().back().type, iEVT_HDD_DISCONNECTED);
+    ClickAt(wxWindow::FindWindowById(1033, dialog), wxPoint(15, 15));  // to the file player
+    EXPECT_FALSE(dialog->IsShown());
+    EXPECT_EQ(EventManager::Get()->History().back().type, QRIX_START_FILEPLAY);
 }
 
 TEST_F(HostSessionTest, PluginsStaticTableTookTheHostsToolbarIdentifierWhenLoaded)

@@ -56,6 +56,27 @@ void Fail(const std::string& what)
 
 }  // namespace
 
+std::vector<std::vector<std::uint8_t>> SplitAccessUnits(const std::vector<std::uint8_t>& stream)
+{
+    // Offsets of the start codes (00 00 01, or 00 00 00 01) of delimiters.
+    std::vector<std::size_t> starts;
+    for (std::size_t i = 0; i + 3 < stream.size(); ++i) {
+        if (stream[i] != 0 || stream[i + 1] != 0 || stream[i + 2] != 1 || (stream[i + 3] & 0x1F) != 9)
+            continue;
+        starts.push_back(i > 0 && stream[i - 1] == 0 ? i - 1 : i);
+    }
+    if (starts.empty() || starts.front() != 0)
+        starts.insert(starts.begin(), 0);
+    std::vector<std::vector<std::uint8_t>> units;
+    for (std::size_t k = 0; k < starts.size(); ++k) {
+        const std::size_t end = k + 1 < starts.size() ? starts[k + 1] : stream.size();
+        if (end > starts[k])
+            units.emplace_back(stream.begin() + static_cast<std::ptrdiff_t>(starts[k]),
+                               stream.begin() + static_cast<std::ptrdiff_t>(end));
+    }
+    return units;
+}
+
 std::vector<std::uint8_t> PatternPayload(std::int32_t block, int frame, std::size_t size)
 {
     std::vector<std::uint8_t> bytes(size);

@@ -102,6 +102,10 @@ enum class Target {
     IndexEntry,    // a = data block number, b = index entry number
 };
 
+// An H.264 elementary stream (Annex B) cut into access units, one per frame:
+// a new unit begins at each access unit delimiter (NAL unit type 9).
+std::vector<std::vector<std::uint8_t>> SplitAccessUnits(const std::vector<std::uint8_t>& stream);
+
 // Frame payloads that say where they belong: useful to check what was read.
 std::vector<std::uint8_t> PatternPayload(std::int32_t block, int frame, std::size_t size);
 

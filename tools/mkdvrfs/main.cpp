@@ -49,6 +49,9 @@ Recordings, in list order, oldest first (repeatable):
                           of generating them (SIZE of --recording is ignored)
   --frame-size N          with --frames: cut FILE into frames of N bytes
                           (default 4096)
+  --h264 FILE             take the frames from an H.264 elementary stream,
+                          one access unit per frame (the stream must carry
+                          access unit delimiters)
 
 Damage, applied after writing (repeatable):
   --damage WHAT           flips one byte covered by the record's XOR sum:
@@ -155,12 +158,17 @@ DamageArg ParseDamage(const std::string& text)
     UsageError("unknown record to damage: '" + kind + "'");
 }
 
-std::vector<std::vector<std::uint8_t>> FramesOfFile(const std::string& path, std::size_t frameSize)
+std::vector<std::uint8_t> ReadFile(const std::string& path)
 {
     std::ifstream in(path, std::ios::binary);
     if (!in)
         UsageError("cannot read " + path);
-    const std::vector<std::uint8_t> bytes((std::istreambuf_iterator<char>(in)), std::istreambuf_iterator<char>());
+    return std::vector<std::uint8_t>((std::istreambuf_iterator<char>(in)), std::istreambuf_iterator<char>());
+}
+
+std::vector<std::vector<std::uint8_t>> FramesOfFile(const std::string& path, std::size_t frameSize)
+{
+    const std::vector<std::uint8_t> bytes = ReadFile(path);
     if (bytes.empty() || frameSize == 0)
         UsageError("no frames in " + path);
     std::vector<std::vector<std::uint8_t>> frames;
@@ -194,7 +202,7 @@ int main(int argc, char** argv)
 {
     enum {
         kBlockSizeShift = 1000, kBlockCount, kBlockSpaceOffset, kBackupOffset, kTableCount, kListMax,
-        kDataBlocks, kAdapterRun, kVersion, kRecordSum, kNoFrame, kRecording, kFrames, kFrameSize, kDamage,
+        kDataBlocks, kAdapterRun, kVersion, kRecordSum, kNoFrame, kRecording, kFrames, kFrameSize, kDamage, kH264,
     };
     static const option options[] = {
         {"block-size-shift", required_argument, nullptr, kBlockSizeShift},
@@ -212,6 +220,7 @@ int main(int argc, char** argv)
         {"frames", required_argument, nullptr, kFrames},
         {"frame-size", required_argument, nullptr, kFrameSize},
         {"damage", required_argument, nullptr, kDamage},
+        {"h264", required_argument, nullptr, kH264},
         {"help", no_argument, nullptr, 'h'},
         {nullptr, 0, nullptr, 0},
     };
@@ -220,6 +229,7 @@ int main(int argc, char** argv)
     std::vector<RecordingArg> recordings;
     std::vector<DamageArg> damage;
     std::string framesFile;
+    bool accessUnits = false;
     std::size_t frameSize = 4096;
     bool runsGiven = false;
     int c = 0;
@@ -247,6 +257,7 @@ int main(int argc, char** argv)
         case kNoFrame: layout.adapterRecordsFrame = false; break;
         case kRecording: recordings.push_back(ParseRecording(optarg)); break;
         case kFrames: framesFile = optarg; break;
+        case kH264: framesFile = optarg; accessUnits = true; break;
         case kFrameSize: frameSize = static_cast<std::size_t>(Number(optarg, "--frame-size")); break;
         case kDamage: damage.push_back(ParseDamage(optarg)); break;
         case 'h': std::cout << kUsage; return 0;
@@ -261,7 +272,7 @@ int main(int argc, char** argv)
         dvrimage::DiskImage image(layout);
         std::vector<std::vector<std::uint8_t>> frames;
         if (!framesFile.empty())
-            frames = FramesOfFile(framesFile, frameSize);
+            frames = accessUnits ? dvrimage::SplitAccessUnits(ReadFile(framesFile)) : FramesOfFile(framesFile, frameSize);
         std::size_t nextFrame = 0;
         for (RecordingArg& arg : recordings) {
             if (frames.empty()) {

@@ -1,0 +1,39 @@
+// What the host knows of each disk playback it answered: the disk, the
+// recording, and the speed of the latest transport command. Shared between
+// the GUI thread (events) and the decoder threads, so every access locks.
+#ifndef HOST_PLAYBACK_CONTROL_H
+#define HOST_PLAYBACK_CONTROL_H
+
+#include <map>
+#include <mutex>
+
+#include <wx/string.h>
+
+#include "host/sdk_api.h"
+
+class QRIX_SDK_API PlaybackControl {
+public:
+    static constexpr int kNormalSpeed = 1024;
+
+    struct Session {
+        wxString path;   // the disk
+        int record = 0;  // list index of the recording (its low 16 bits)
+        int speed = kNormalSpeed;
+    };
+
+    static PlaybackControl* Get();
+
+    void Start(long long dvrId, const wxString& path, int record);
+    void SetSpeed(long long dvrId, int speed);
+    // A copy of the session of a DVR; false when the host never answered it.
+    bool Find(long long dvrId, Session* session) const;
+    int Speed(long long dvrId) const;
+    void Forget(long long dvrId);
+
+private:
+    PlaybackControl() = default;
+    mutable std::mutex m_mutex;
+    std::map<long long, Session> m_sessions;
+};
+
+#endif
