@@ -20,6 +20,7 @@
 
 #include "qrixhost/host_session.h"
 #include "tests/gui/gui_harness.h"
+#include "tests/host/clip_disk.h"
 #include "tools/dvrimage/dvr_image.h"
 
 namespace {
@@ -46,35 +47,9 @@ protected:
         std::filesystem::remove_all(dir_);
     }
 
-    // The sample clip, one second (25 frames, one key frame) per data block.
     static void WriteSampleDisk(const std::string& path)
     {
-        std::ifstream in(MORVANE_SOURCE_DIR "/samples/clip.h264", std::ios::binary);
-        const std::vector<std::uint8_t> clip((std::istreambuf_iterator<char>(in)), std::istreambuf_iterator<char>());
-        const std::vector<std::vector<std::uint8_t>> frames = dvrimage::SplitAccessUnits(clip);
-        dvrimage::Layout layout;
-        layout.dataBlockMax = 16;
-        dvrimage::DiskImage image(layout);
-        std::size_t next = 0;
-        auto recording = [&](int idx, int start, int end, std::uint32_t t0) {
-            dvrimage::Recording r;
-            r.listIdx = idx;
-            r.startBlock = start;
-            r.endBlock = end;
-            r.startTime = t0;
-            r.endTime = t0 + 3600;
-            const int blocks = end >= start ? end - start + 1 : end + 16 - start + 1;
-            for (int b = 0; b < blocks; ++b) {
-                r.blocks.emplace_back();
-                for (int k = 0; k < 25; ++k, next = (next + 1) % frames.size())
-                    r.blocks.back().push_back(dvrimage::Frame{frames[next], 1});
-            }
-            image.Add(r);
-        };
-        recording(0, 2, 4, 1700000000);
-        recording(1, 5, 9, 1700007200);
-        recording(2, 12, 1, 1700014400);
-        image.Write(path);
+        WriteClipDisk(path, {{0, 2, 4, 1700000000}, {1, 5, 9, 1700007200}, {2, 12, 1, 1700014400}});
     }
 
     // A real click (through the X server) at a point of a window.

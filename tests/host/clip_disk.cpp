@@ -1,0 +1,34 @@
+#include "tests/host/clip_disk.h"
+
+#include <fstream>
+#include <iterator>
+
+dvrimage::DiskImage WriteClipDisk(const std::string& path, const std::vector<ClipRecording>& recordings,
+                                  int dataBlocks)
+{
+    std::ifstream in(MORVANE_SOURCE_DIR "/samples/clip.h264", std::ios::binary);
+    const std::vector<std::uint8_t> clip((std::istreambuf_iterator<char>(in)), std::istreambuf_iterator<char>());
+    const std::vector<std::vector<std::uint8_t>> frames = dvrimage::SplitAccessUnits(clip);
+    dvrimage::Layout layout;
+    layout.dataBlockMax = dataBlocks;
+    dvrimage::DiskImage image(layout);
+    std::size_t next = 0;
+    for (const ClipRecording& c : recordings) {
+        dvrimage::Recording r;
+        r.listIdx = c.listIdx;
+        r.startBlock = c.startBlock;
+        r.endBlock = c.endBlock;
+        r.startTime = c.startTime;
+        r.endTime = c.startTime + 3600;
+        const int blocks = c.endBlock >= c.startBlock ? c.endBlock - c.startBlock + 1
+                                                      : c.endBlock + dataBlocks - c.startBlock + 1;
+        for (int b = 0; b < blocks; ++b) {
+            r.blocks.emplace_back();
+            for (int k = 0; k < 25; ++k, next = (next + 1) % frames.size())
+                r.blocks.back().push_back(dvrimage::Frame{frames[next], 1});
+        }
+        image.Add(r);
+    }
+    image.Write(path);
+    return image;
+}
