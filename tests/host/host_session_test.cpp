@@ -18,6 +18,7 @@
 #include <wx/treectrl.h>
 #include <wx/uiaction.h>
 
+#include "qrixhost/file_player.h"
 #include "qrixhost/host_session.h"
 #include "tests/gui/gui_harness.h"
 #include "tests/host/clip_disk.h"
@@ -205,6 +206,15 @@ TEST_F(HostSessionTest, ActivatedRowPlaysInTheCanvasAndTheTransportCommandsReach
     ClickAt(wxWindow::FindWindowById(1033, dialog), wxPoint(15, 15));  // to the file player
     EXPECT_FALSE(dialog->IsShown());
     EXPECT_EQ(EventManager::Get()->History().back().type, QRIX_START_FILEPLAY);
+    // The host's file player plays the same recording in a window of its own.
+    FilePlayer* player = nullptr;
+    for (wxWindow* window : wxTopLevelWindows)
+        if (auto* p = dynamic_cast<FilePlayer*>(window))
+            player = p;
+    ASSERT_NE(player, nullptr);
+    EXPECT_TRUE(player->GetTitle().Contains("recording 1"));
+    gui::Pump(600);
+    EXPECT_GT(player->canvas()->PicturesReceived(), 3);
 }
 
 TEST_F(HostSessionTest, PluginsStaticTableTookTheHostsToolbarIdentifierWhenLoaded)
