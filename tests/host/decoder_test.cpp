@@ -126,11 +126,11 @@ TEST_F(DecoderTest, SpeedCodesSetThePaceAndPauseHoldsThePicture)
 
 TEST_F(DecoderTest, BackwardShowsTheKeyFramesInReverseOrder)
 {
-    WriteClipDisk(disk_, {{0, 0, 7, 100}});
-    Start(0, 4096);
-    Watch(800);  // forward into block 1 or later
-    // A key frame every 250 ms: a few of them, before the walk would wrap
-    // round to the end of the newest recording.
+    // From block 4 back to block 0 are five key frames, one every 250 ms at
+    // this speed: more than the watch can see, however slow the machine.
+    WriteClipDisk(disk_, {{0, 0, 3, 100}, {1, 4, 7, 200}});
+    Start(1, 1024);
+    Watch(300);
     PlaybackControl::Get()->SetSpeed(kDvr, -4096);
     std::this_thread::sleep_for(std::chrono::milliseconds(60));  // a forward frame may still be on its way
     std::vector<long long> seen = Watch(700);
