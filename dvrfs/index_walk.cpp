@@ -88,6 +88,7 @@ int DvrDiskReader::SearchAdapter(wxFile* file)
     int chosen = -1;
     for (int i = 0; i < 2 * kAdapterSlotCount; ++i) {
         const int slot = i % kAdapterSlotCount;
+        ClearRecords(Bytes(candidate.get()), kAdapterSize);
         if (BlockRead(file, slot * slotStride, Bytes(candidate.get()), kAdapterSize) < 0)
             return -1;
         if (AdapterSlotIsValid(*candidate, slot))
@@ -97,6 +98,7 @@ int DvrDiskReader::SearchAdapter(wxFile* file)
     }
 
     // With no valid slot the position is negative and the read refuses it.
+    ClearRecords(Bytes(candidate.get()), kAdapterSize);
     if (BlockRead(file, chosen * slotStride, Bytes(candidate.get()), kAdapterSize) < 0)
         return -1;
     if (!AdapterSlotIsValid(*candidate, chosen))
@@ -218,8 +220,9 @@ int DvrDiskReader::ReadListEntries(wxFile* file, wxInt64 index, int count, char*
         return Refuse(kErrListNegative, kAtListNegative);
     if (index + count > adapter.ListMax)
         return Refuse(kErrListBeyond, kAtListBeyond);
-    if (BlockRead(file, RecordPosition(adapter.ListOffset, index, kListEntrySize, 0), buffer,
-                  RecordBytes(count, kListEntrySize)) < 0)
+    const int bytes = RecordBytes(count, kListEntrySize);
+    ClearRecords(buffer, bytes);
+    if (BlockRead(file, RecordPosition(adapter.ListOffset, index, kListEntrySize, 0), buffer, bytes) < 0)
         return -1;
     for (int j = 0; j < count; ++j) {
         char* entry = buffer + static_cast<wxInt64>(j) * kListEntrySize;
@@ -227,6 +230,7 @@ int DvrDiskReader::ReadListEntries(wxFile* file, wxInt64 index, int count, char*
             continue;
         // Damaged in the ring: take the mirror copy; code 50 stays either way.
         SetError(kErrListEntry, kAtListEntry);
+        ClearRecords(entry, kListEntrySize);
         if (BlockRead(file, RecordPosition(adapter.ListOffsetBackup, index + j, kListEntrySize, 0), entry,
                       kListEntrySize) < 0)
             return -1;
@@ -248,6 +252,7 @@ int DvrDiskReader::ReadBlockHeaders(wxFile* file, wxInt64 block, int count, char
         return Refuse(kErrBlockBeyond, kAtBlockBeyond);
     for (int j = 0; j < count; ++j) {
         char* header = buffer + static_cast<wxInt64>(j) * kBlockHeaderSize;
+        ClearRecords(header, kBlockHeaderSize);
         if (BlockRead(file, RecordPosition(adapter.DataBlockOffset, block + j, kDataBlockSize, 0), header,
                       kBlockHeaderSize) < 0)
             return -1;
@@ -274,7 +279,9 @@ int DvrDiskReader::ReadIndexEntries(wxFile* file, wxInt64 block, wxInt64 first, 
         __builtin_add_overflow(block, 1, &nextBlock)
             ? -1
             : RecordPosition(adapter.DataBlockOffset, nextBlock, kDataBlockSize, -(first + count) * kIndexEntrySize);
-    if (BlockRead(file, position, buffer, RecordBytes(count, kIndexEntrySize)) < 0)
+    const int bytes = RecordBytes(count, kIndexEntrySize);
+    ClearRecords(buffer, bytes);
+    if (BlockRead(file, position, buffer, bytes) < 0)
         return -1;
     for (wxInt64 j = 0; j < count; ++j) {
         if (!RecordSumMatches(buffer + j * kIndexEntrySize, kIndexEntrySize))

@@ -5,6 +5,7 @@
 
 #include <climits>
 #include <cstdint>
+#include <cstring>
 
 namespace dvrfs {
 
@@ -43,6 +44,15 @@ inline int RecordBytes(std::int64_t count, int size)
 inline char* Bytes(void* record)
 {
     return static_cast<char*>(record);
+}
+
+// Clears a record's buffer before it is read. A piece of a read that the
+// device does not deliver is left as it was; cleared, it fails the record's
+// XOR sum instead of passing off what the buffer held before as the record.
+inline void ClearRecords(char* buffer, int bytes)
+{
+    if (buffer && bytes > 0)
+        std::memset(buffer, 0, static_cast<std::size_t>(bytes));
 }
 
 }  // namespace dvrfs

@@ -24,6 +24,8 @@ struct State {
     std::map<int, std::string> pathOfFd;
     std::vector<iotrace::OpenCall> opens;
     std::map<std::string, std::vector<iotrace::ReadCall>> reads;
+    std::map<std::string, std::size_t> readCounts;
+    bool keepReads = true;
     std::vector<Fault> failures;
     std::vector<Fault> corruptions;
 };
@@ -87,7 +89,9 @@ extern "C" ssize_t read(int fd, void* buffer, size_t count)
     }
     const std::int64_t offset = lseek64(fd, 0, SEEK_CUR);
     std::unique_lock<std::mutex> lock(s.mutex);
-    s.reads[path].push_back({offset, count});
+    ++s.readCounts[path];
+    if (s.keepReads)
+        s.reads[path].push_back({offset, count});
     for (const Fault& f : s.failures) {
         if (f.path == path && offset < f.offset + f.length && f.offset < offset + static_cast<std::int64_t>(count)) {
             errno = EIO;
@@ -114,6 +118,8 @@ void Reset()
     std::lock_guard<std::mutex> lock(s.mutex);
     s.opens.clear();
     s.reads.clear();
+    s.readCounts.clear();
+    s.keepReads = true;
     s.failures.clear();
     s.corruptions.clear();
 }
@@ -134,6 +140,20 @@ std::vector<ReadCall> Reads(const std::string& path)
     State& s = TheState();
     std::lock_guard<std::mutex> lock(s.mutex);
     return s.reads[path];
+}
+
+std::size_t ReadCount(const std::string& path)
+{
+    State& s = TheState();
+    std::lock_guard<std::mutex> lock(s.mutex);
+    return s.readCounts[path];
+}
+
+void KeepReads(bool keep)
+{
+    State& s = TheState();
+    std::lock_guard<std::mutex> lock(s.mutex);
+    s.keepReads = keep;
 }
 
 void FailReads(const std::string& path, std::int64_t offset, std::int64_t length)

@@ -28,6 +28,11 @@ void Reset();
 
 std::vector<OpenCall> Opens(const std::string& path);
 std::vector<ReadCall> Reads(const std::string& path);
+// How many reads of `path` there were; counted also while reads are not kept.
+std::size_t ReadCount(const std::string& path);
+// Whether each read is kept (the default) or only counted: millions of them
+// would measure the trace instead of the reader.
+void KeepReads(bool keep);
 
 // Reads of `path` that overlap [offset, offset + length) fail with EIO.
 void FailReads(const std::string& path, std::int64_t offset, std::int64_t length);

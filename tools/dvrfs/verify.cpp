@@ -38,7 +38,7 @@ public:
             return result_;
         }
         result_.stage = VerifyStage::kComplete;
-        CheckListSpan();
+        CheckListSpan(SpanOnDisk());
         CheckRecordings();
         return result_;
     }
@@ -124,12 +124,24 @@ private:
         }
     }
 
+    // The span of recordings as the current adapter's slot on the disk gives
+    // it: the search's refresh narrows the adapter in memory to the readable
+    // entries, which would hide damage at either end.
+    std::pair<std::int64_t, std::int64_t> SpanOnDisk()
+    {
+        _HisiAdapter_t slot{};
+        const std::uint64_t position = static_cast<std::uint64_t>(Adapter().Idx) * reader_.m_volume->superBlock.BlockSize;
+        if (Adapter().Idx >= 0 && ReadAt(position, &slot, kAdapterSize) && slot.Idx == Adapter().Idx)
+            return {slot.FirstList.Idx, slot.LastList.Idx};
+        return {Adapter().FirstList.Idx, Adapter().LastList.Idx};
+    }
+
     // Each list position of the span once, in the list ring and in the mirror.
-    void CheckListSpan()
+    void CheckListSpan(std::pair<std::int64_t, std::int64_t> span)
     {
         const std::int64_t ringSize = Adapter().ListMax;
-        const std::int64_t first = Adapter().FirstList.Idx;
-        std::int64_t last = Adapter().LastList.Idx;
+        const std::int64_t first = span.first;
+        std::int64_t last = span.second;
         if (last < first)
             last += ringSize;
         if (ringSize <= 0 || last < first)

@@ -1,0 +1,28 @@
+// Fuzz inputs are disk images written as extents: a disk is mostly holes
+// (data blocks are 16 MiB apart), so an input lists only the pieces that
+// hold bytes. Each extent is an 8-byte little-endian offset, a 2-byte
+// length, then that many bytes.
+#ifndef TESTS_FUZZ_EXTENT_IMAGE_H
+#define TESTS_FUZZ_EXTENT_IMAGE_H
+
+#include <cstddef>
+#include <cstdint>
+#include <string>
+#include <vector>
+
+namespace fuzzdisk {
+
+// Offsets beyond this are dropped: a disk of 1 TiB is plenty to reach every
+// structure, and the file system holding the image takes it.
+constexpr std::uint64_t kMaxOffset = 1ull << 40;
+
+// Writes the image the extents describe to a sparse file of this process
+// (replacing the previous one) and returns its path.
+std::string WriteImage(const std::uint8_t* data, std::size_t size);
+
+// The extents of a sparse file, as an input (for seeds).
+std::vector<std::uint8_t> ReadExtents(const std::string& path);
+
+}  // namespace fuzzdisk
+
+#endif

@@ -1,0 +1,191 @@
+// A hostile or failing disk: read-only access, bounded work on the worst
+// disks the writer can make, and a medium that fails under the reader.
+#include <sys/resource.h>
+#include <sys/stat.h>
+
+#include <climits>
+#include <cstdio>
+#include <filesystem>
+
+#include "catalog/catalog_reader.h"
+#include "tests/support/disk_fixture.h"
+#include "tests/support/io_trace.h"
+#include "tools/dvrfs/disk_check.h"
+
+namespace {
+
+using dvrimage::DiskImage;
+using dvrimage::GeneratedRecording;
+using dvrimage::Layout;
+
+long PeakMemoryKiB()
+{
+    rusage usage{};
+    getrusage(RUSAGE_SELF, &usage);
+    return usage.ru_maxrss;
+}
+
+class RobustnessTest : public DiskTest {
+protected:
+    CatalogBuild Build(const std::string& path) { return catalog_.BuildCatalog(wxString::FromUTF8(path.c_str())); }
+    CatalogReader catalog_;
+};
+
+TEST_F(RobustnessTest, ReadOnlyImageIsOnlyEverOpenedForReadingAndKeepsItsBytes)
+{
+    DiskImage image(SmallLayout());
+    image.Add(GeneratedRecording(0, 0, 1, 100, 200, 8));
+    image.Add(GeneratedRecording(1, 6, 0, 300, 400, 8));
+    const std::string path = WriteImage(image);
+    ASSERT_EQ(::chmod(path.c_str(), 0444), 0);
+    const std::string before = FileFingerprint(path);
+
+    ASSERT_EQ(Build(path), CatalogBuild::kBuilt);
+    CatalogReader verifier;
+    dvrfstool::VerifyDisk(verifier, wxString::FromUTF8(path.c_str()), [](const std::string&) {});
+    _HisiList_t recording{};
+    ASSERT_TRUE(dvrfstool::RecordingOfRow(catalog_, 1, &recording));
+    const dvrfstool::ExtractResult extracted =
+        dvrfstool::ExtractRecording(catalog_, recording, [](const unsigned char*, std::size_t) { return true; });
+    EXPECT_EQ(extracted.frames, 9);
+
+    EXPECT_EQ(FileFingerprint(path), before);
+    const std::vector<iotrace::OpenCall> opens = iotrace::Opens(path);
+    ASSERT_GE(opens.size(), 2u);
+    for (const iotrace::OpenCall& call : opens)
+        EXPECT_EQ(call.flags & O_ACCMODE, O_RDONLY);
+}
+
+// The worst list the writer can make: a ring of the largest size the reader
+// takes, the span covering all of it, every entry but the first unreadable in
+// both copies.
+TEST_F(RobustnessTest, LargestListRingFullOfDamageCostsABoundedNumberOfReads)
+{
+    Layout layout = SmallLayout();
+    layout.listMax = kMaxListMax;
+    layout.adapterRuns = {{0, 120}};
+    layout.firstListIdx = 0;
+    layout.lastListIdx = kMaxListMax - 1;
+    DiskImage image(layout);
+    image.Add(GeneratedRecording(0, 0, 0, 100, 200, 8, 1, 16));
+    const std::string path = WriteImage(image);
+
+    iotrace::KeepReads(false);
+    const long memoryBefore = PeakMemoryKiB();
+    ASSERT_EQ(Build(path), CatalogBuild::kBuilt);
+    const std::size_t buildReads = iotrace::ReadCount(path);
+    EXPECT_EQ(catalog_.m_recordCount, 1);
+    EXPECT_EQ(catalog_.m_errorCode, 50);
+
+    iotrace::Reset();
+    iotrace::KeepReads(false);
+    CatalogReader verifier;
+    const dvrfstool::VerifyResult verified =
+        dvrfstool::VerifyDisk(verifier, wxString::FromUTF8(path.c_str()), [](const std::string&) {});
+    const std::size_t verifyReads = iotrace::ReadCount(path);
+    const long memoryAfter = PeakMemoryKiB();
+
+    // Build: superblocks, 241 adapter slots, the refresh's two reads (ring and
+    // mirror) of every entry, a few records, then the catalogue's walk.
+    EXPECT_LE(buildReads, 2u * kMaxListMax + 300);
+    // Verify: the search's refresh, then the two copies of every entry of the
+    // span as the disk gives it, the slots, one recording.
+    EXPECT_LE(verifyReads, 4u * kMaxListMax + 600);
+    EXPECT_EQ(verified.damaged, kMaxListMax - 1);
+    EXPECT_LT(memoryAfter - memoryBefore, 16 * 1024);
+    std::printf("[ figures  ] list ring of %d entries, all but one damaged: build %zu reads, verify %zu reads, "
+                "peak memory +%ld KiB\n",
+                kMaxListMax, buildReads, verifyReads, memoryAfter - memoryBefore);
+}
+
+// The worst data ring walk: the newest recording claims a ring of 2^20 blocks
+// whose headers are all missing, so the refresh's backward search tries them
+// all, once each.
+TEST_F(RobustnessTest, NewestRecordingWithoutAnyHeaderIsSearchedOnceRoundTheRing)
+{
+    Layout layout = SmallLayout();
+    layout.dataBlockMax = 1 << 20;
+    layout.blockSizeShift = 20;  // 1 MiB blocks: the ring needs 16 TiB of block space
+    layout.imageSize = 1ull << 30;
+    layout.firstListIdx = 0;
+    layout.lastListIdx = 0;
+    DiskImage image(layout);
+    const std::string path = WriteImage(image);
+    const dvrimage::ListEntryBytes entry = image.MakeListEntry(0, 1, 0, 100, 200);  // 1 .. 0: the whole ring
+    image.WriteLogical(image.ListOffset(), entry.data(), entry.size());
+    image.WriteLogical(image.ListOffsetBackup(), entry.data(), entry.size());
+    Refingerprint(path);
+
+    iotrace::KeepReads(false);
+    EXPECT_EQ(Build(path), CatalogBuild::kNoAdapter);
+    const std::size_t reads = iotrace::ReadCount(path);
+    EXPECT_LE(reads, (1u << 20) + 400);
+    std::printf("[ figures  ] data ring of %d blocks without headers: build gave up after %zu reads\n", 1 << 20,
+                reads);
+}
+
+TEST_F(RobustnessTest, ImageEndingInTheMiddleOfTheListStopsTheCatalogueThere)
+{
+    DiskImage image(SmallLayout());
+    for (int i = 0; i < 6; ++i)
+        image.Add(GeneratedRecording(i, i, i, 100 * i, 100 * i + 50, 8, 1, 16));
+    const std::string path = WriteImage(image);
+    // Cut the file in the middle of list entry 3 (and so before its mirror and
+    // the data blocks).
+    std::filesystem::resize_file(path, image.PhysicalOffset(image.ListOffset() + 3 * 128 + 60));
+    Refingerprint(path);
+
+    // Entries 0 to 2 read; the newest of them has its data block beyond the
+    // end, so the adapter cannot be brought up to date: no catalogue, and the
+    // register names the missing header.
+    EXPECT_EQ(Build(path), CatalogBuild::kNoAdapter);
+    EXPECT_EQ(catalog_.m_errorCode, 52);
+    EXPECT_EQ(catalog_.m_recordCount, 0);
+}
+
+TEST_F(RobustnessTest, UnreadableSectorEndsTheCatalogueAtItsEntryAndSaysSo)
+{
+    DiskImage image(SmallLayout());
+    for (int i = 0; i < 6; ++i)
+        image.Add(GeneratedRecording(i, i, i, 100 * i, 100 * i + 50, 8, 1, 16));
+    const std::string path = WriteImage(image);
+    ASSERT_EQ(Build(path), CatalogBuild::kBuilt);
+    ASSERT_EQ(catalog_.m_recordCount, 6);
+
+    // The sector of entry 4, in the ring and in the mirror, fails from now on:
+    // the next build sees entries 0 to 3 only.
+    iotrace::FailReads(path, static_cast<std::int64_t>(image.PhysicalOffset(image.ListOffset() + 4 * 128)), 1);
+    iotrace::FailReads(path, static_cast<std::int64_t>(image.PhysicalOffset(image.ListOffsetBackup() + 4 * 128)), 1);
+    EXPECT_EQ(Build(path), CatalogBuild::kBuilt);
+    EXPECT_EQ(catalog_.m_recordCount, 4);
+    EXPECT_EQ(catalog_.m_errorCode, 50);
+    EXPECT_STREQ(catalog_.m_errorText, "FUNCTION[1463]");
+}
+
+TEST_F(RobustnessTest, DiskThatDisappearsKeepsTheCatalogueAndFailsTheReads)
+{
+    DiskImage image(SmallLayout());
+    image.Add(GeneratedRecording(0, 0, 1, 100, 200, 8, 3, 16));
+    image.Add(GeneratedRecording(1, 2, 3, 300, 400, 8, 3, 16));
+    const std::string path = WriteImage(image);
+    ASSERT_EQ(Build(path), CatalogBuild::kBuilt);
+
+    // The disk goes away under the open handle: every read now finds nothing.
+    std::filesystem::resize_file(path, 0);
+    std::filesystem::remove(path);
+    Refingerprint(path);
+    catalog_.m_streamBlock = 0;
+    catalog_.m_streamFrame = 0;
+    std::vector<unsigned char> payload(16);
+    _HisiHeader_t header{};
+    const _HisiAdapter_t adapter = *catalog_.m_volume->adapter;
+    EXPECT_EQ(catalog_.get_stream(catalog_.m_diskFile, payload.data(), &header, adapter.FirstList, adapter.LastList, 1),
+              -1);
+    EXPECT_EQ(catalog_.m_errorCode, 52);
+
+    EXPECT_EQ(Build(path), CatalogBuild::kNotOpened);
+    EXPECT_EQ(catalog_.m_recordCount, 2);  // what was listed stays listed
+    EXPECT_EQ(catalog_.m_catalog->Entries[1].StartTime, 300);
+}
+
+}  // namespace
