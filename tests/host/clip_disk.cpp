@@ -1,14 +1,11 @@
 #include "tests/host/clip_disk.h"
 
-#include <fstream>
-#include <iterator>
 
 dvrimage::DiskImage WriteClipDisk(const std::string& path, const std::vector<ClipRecording>& recordings,
                                   int dataBlocks)
 {
-    std::ifstream in(MORVANE_SOURCE_DIR "/samples/clip.h264", std::ios::binary);
-    const std::vector<std::uint8_t> clip((std::istreambuf_iterator<char>(in)), std::istreambuf_iterator<char>());
-    const std::vector<std::vector<std::uint8_t>> frames = dvrimage::SplitAccessUnits(clip);
+    const std::vector<std::vector<std::uint8_t>> frames =
+        dvrimage::AccessUnitsOfFile(MORVANE_SOURCE_DIR "/samples/clip.h264");
     dvrimage::Layout layout;
     layout.dataBlockMax = dataBlocks;
     dvrimage::DiskImage image(layout);

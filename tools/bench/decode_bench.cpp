@@ -6,8 +6,6 @@
 
 #include <cstdio>
 #include <filesystem>
-#include <fstream>
-#include <iterator>
 
 #include "catalog/catalog_reader.h"
 #include "host/h264_decoder.h"
@@ -25,9 +23,8 @@ struct ClipDisk {
 
     ClipDisk()
     {
-        std::ifstream in(MORVANE_SOURCE_DIR "/samples/clip.h264", std::ios::binary);
-        const std::vector<std::uint8_t> clip((std::istreambuf_iterator<char>(in)), std::istreambuf_iterator<char>());
-        const std::vector<std::vector<std::uint8_t>> units = dvrimage::SplitAccessUnits(clip);
+        const std::vector<std::vector<std::uint8_t>> units =
+            dvrimage::AccessUnitsOfFile(MORVANE_SOURCE_DIR "/samples/clip.h264");
         dvrimage::Layout layout;
         layout.dataBlockMax = kBlocks;
         dvrimage::DiskImage image(layout);

@@ -6,6 +6,8 @@
 #include <algorithm>
 #include <cerrno>
 #include <cstring>
+#include <fstream>
+#include <iterator>
 #include <stdexcept>
 #include <system_error>
 
@@ -75,6 +77,13 @@ std::vector<std::vector<std::uint8_t>> SplitAccessUnits(const std::vector<std::u
                                stream.begin() + static_cast<std::ptrdiff_t>(end));
     }
     return units;
+}
+
+std::vector<std::vector<std::uint8_t>> AccessUnitsOfFile(const std::string& path)
+{
+    std::ifstream in(path, std::ios::binary);
+    const std::vector<std::uint8_t> stream((std::istreambuf_iterator<char>(in)), std::istreambuf_iterator<char>());
+    return stream.empty() ? std::vector<std::vector<std::uint8_t>>{} : SplitAccessUnits(stream);
 }
 
 std::vector<std::uint8_t> PatternPayload(std::int32_t block, int frame, std::size_t size)

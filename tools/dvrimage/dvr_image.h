@@ -105,6 +105,8 @@ enum class Target {
 // An H.264 elementary stream (Annex B) cut into access units, one per frame:
 // a new unit begins at each access unit delimiter (NAL unit type 9).
 std::vector<std::vector<std::uint8_t>> SplitAccessUnits(const std::vector<std::uint8_t>& stream);
+// The access units of an H.264 stream file; none when it cannot be read.
+std::vector<std::vector<std::uint8_t>> AccessUnitsOfFile(const std::string& path);
 
 // Frame payloads that say where they belong: useful to check what was read.
 std::vector<std::uint8_t> PatternPayload(std::int32_t block, int frame, std::size_t size);

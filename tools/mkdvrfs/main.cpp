@@ -272,7 +272,9 @@ int main(int argc, char** argv)
         dvrimage::DiskImage image(layout);
         std::vector<std::vector<std::uint8_t>> frames;
         if (!framesFile.empty())
-            frames = accessUnits ? dvrimage::SplitAccessUnits(ReadFile(framesFile)) : FramesOfFile(framesFile, frameSize);
+            frames = accessUnits ? dvrimage::AccessUnitsOfFile(framesFile) : FramesOfFile(framesFile, frameSize);
+        if (!framesFile.empty() && frames.empty())
+            UsageError("no frames in " + framesFile);
         std::size_t nextFrame = 0;
         for (RecordingArg& arg : recordings) {
             if (frames.empty()) {
