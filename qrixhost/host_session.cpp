@@ -1,12 +1,11 @@
 #include "qrixhost/host_session.h"
 
-#include "qrixhost/file_player.h"
-
 #include <wx/app.h>
 #include <wx/menu.h>
-#include <wx/msgdlg.h>
 #include <wx/sizer.h>
 #include <wx/stattext.h>
+
+#include "qrixhost/file_player.h"
 
 namespace {
 
