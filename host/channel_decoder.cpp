@@ -37,14 +37,11 @@ public:
     // of its recording; false when there is nothing to play.
     bool Open(const PlaybackControl::Session& session)
     {
-        if (m_reader.OpenDVRFS(session.path) <= 0 || m_reader.Checkconfig() <= 0 ||
-            (m_reader.BlockOpe(m_reader.m_diskFile, 2, nullptr, 0, 0) < 0 && !m_reader.m_volume->adapter))
+        _HisiList_t recording{};
+        if (!OpenRecording(m_reader, session.path, session.record, &recording))
             return false;
         const _HisiAdapter_t& adapter = *m_reader.m_volume->adapter;
-        if (adapter.ListMax <= 0 || adapter.DataBlockMax <= 0)
-            return false;
-        _HisiList_t recording{};
-        if (m_reader.BlockOpe(m_reader.m_diskFile, 33, &recording, session.record % adapter.ListMax, 1) < 0)
+        if (adapter.DataBlockMax <= 0)
             return false;
         m_oldest = adapter.FirstList;
         m_newest = adapter.LastList;

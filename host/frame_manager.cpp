@@ -6,14 +6,7 @@
 #include <wx/glcanvas.h>
 
 #include "host/sdk_services.h"
-
-namespace {
-
-// The attributes every canvas of the host uses, so that one context serves all.
-int kCanvasAttributes[] = {WX_GL_RGBA, WX_GL_MIN_RED, 1, WX_GL_MIN_GREEN, 1, WX_GL_MIN_BLUE, 1,
-                           WX_GL_DEPTH_SIZE, 1, WX_GL_DOUBLEBUFFER, 0};
-
-}  // namespace
+#include "host/sdk_video.h"
 
 FrameManager* FrameManager::Get()
 {
@@ -28,7 +21,7 @@ wxGLContext* FrameManager::GLRCProcess(int operation, wxGLContext*)
     if (!m_context) {
         // The context is made on a canvas of a window that is never shown.
         m_contextFrame = new wxFrame(nullptr, wxID_ANY, "shared OpenGL context");
-        auto* canvas = new wxGLCanvas(m_contextFrame, wxID_ANY, kCanvasAttributes);
+        auto* canvas = new wxGLCanvas(m_contextFrame, wxID_ANY, BasicGLPane::HostAttributes());
         m_context = new wxGLContext(canvas);
     }
     return m_context;

@@ -15,6 +15,13 @@ BasicGLPane::BasicGLPane(wxWindow* parent, int* attributes, wxGLContext* context
 {
 }
 
+int* BasicGLPane::HostAttributes()
+{
+    static int attributes[] = {WX_GL_RGBA, WX_GL_MIN_RED, 1, WX_GL_MIN_GREEN, 1, WX_GL_MIN_BLUE, 1,
+                               WX_GL_DEPTH_SIZE, 1, WX_GL_DOUBLEBUFFER, 0};
+    return attributes;
+}
+
 void BasicGLPane::Init()
 {
     Bind(wxEVT_PAINT, &BasicGLPane::OnRender, this);

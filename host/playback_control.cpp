@@ -1,5 +1,7 @@
 #include "host/playback_control.h"
 
+#include "catalog/catalog_reader.h"
+
 PlaybackControl* PlaybackControl::Get()
 {
     static PlaybackControl* control = new PlaybackControl;
@@ -45,4 +47,15 @@ void PlaybackControl::Forget(long long dvrId)
 {
     std::lock_guard<std::mutex> lock(m_mutex);
     m_sessions.erase(dvrId);
+}
+
+bool OpenRecording(CatalogReader& reader, const wxString& disk, int record, _HisiList_t* recording)
+{
+    if (reader.OpenDVRFS(disk) <= 0 || reader.Checkconfig() <= 0)
+        return false;
+    if (reader.BlockOpe(reader.m_diskFile, 2, nullptr, 0, 0) < 0 && !reader.m_volume->adapter)
+        return false;
+    const int ringSize = reader.m_volume->adapter->ListMax;
+    return ringSize > 0 && record >= 0 && reader.BlockOpe(reader.m_diskFile, 33, recording, record % ringSize, 1) > 0 &&
+           (recording->Idx & 0xFFFF) == record;
 }

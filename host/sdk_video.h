@@ -21,6 +21,9 @@ public:
     // `context` is the shared context of the host's frame manager; a canvas
     // without one shows nothing.
     BasicGLPane(wxWindow* parent, int* attributes, wxGLContext* context, const wxPoint& pos, const wxSize& size);
+    // Host side: the attributes of every canvas the host makes itself, the
+    // same as a plugin's, so that the one shared context serves them all.
+    static int* HostAttributes();
 
     void Init();
     void OnEraseBackground(wxEraseEvent& event);

@@ -10,19 +10,12 @@ namespace {
 wxString g_lastDisk;
 int g_lastRecord = -1;
 
-// Whether the disk holds a recording at list position `record` (its low 16
-// bits, as the event carries it).
+// Whether the disk holds a recording at list position `record`.
 bool DiskHoldsRecording(const wxString& disk, int record)
 {
     CatalogReader reader;
-    if (reader.OpenDVRFS(disk) <= 0 || reader.Checkconfig() <= 0)
-        return false;
-    if (reader.BlockOpe(reader.m_diskFile, 2, nullptr, 0, 0) < 0 && !reader.m_volume->adapter)
-        return false;
-    const int ringSize = reader.m_volume->adapter->ListMax;
-    _HisiList_t entry{};
-    return ringSize > 0 && reader.BlockOpe(reader.m_diskFile, 33, &entry, record % ringSize, 1) > 0 &&
-           (entry.Idx & 0xFFFF) == record;
+    _HisiList_t recording{};
+    return OpenRecording(reader, disk, record, &recording);
 }
 
 }  // namespace

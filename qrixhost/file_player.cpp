@@ -8,8 +8,6 @@ namespace {
 
 std::set<FilePlayer*> g_players;
 
-int kCanvasAttributes[] = {WX_GL_RGBA, WX_GL_MIN_RED, 1, WX_GL_MIN_GREEN, 1, WX_GL_MIN_BLUE, 1,
-                           WX_GL_DEPTH_SIZE, 1, WX_GL_DOUBLEBUFFER, 0};
 
 }  // namespace
 
@@ -19,7 +17,7 @@ FilePlayer::FilePlayer(const wxString& disk, int record)
       m_id(getCPUTickCount()),
       m_tick(this)
 {
-    m_canvas = new BasicGLPane(this, kCanvasAttributes, FrameManager::Get()->GLRCProcess(1, nullptr), wxDefaultPosition,
+    m_canvas = new BasicGLPane(this, BasicGLPane::HostAttributes(), FrameManager::Get()->GLRCProcess(1, nullptr), wxDefaultPosition,
                                wxDefaultSize);
     m_canvas->Init();
     m_canvas->SetOnAllChannels(0, 1, 3);

@@ -18,9 +18,6 @@
 
 namespace {
 
-int kAttributes[] = {WX_GL_RGBA, WX_GL_MIN_RED, 1, WX_GL_MIN_GREEN, 1, WX_GL_MIN_BLUE, 1, WX_GL_DEPTH_SIZE, 1,
-                     WX_GL_DOUBLEBUFFER, 0};
-
 class DecoderTest : public ::testing::Test {
 protected:
     void SetUp() override
@@ -29,7 +26,7 @@ protected:
         std::filesystem::create_directories(dir_);
         disk_ = (dir_ / "disk.img").string();
         frame_ = new wxFrame(nullptr, wxID_ANY, "canvas", wxDefaultPosition, wxSize(400, 320));
-        canvas_ = new BasicGLPane(frame_, kAttributes, FrameManager::Get()->GLRCProcess(1, nullptr),
+        canvas_ = new BasicGLPane(frame_, BasicGLPane::HostAttributes(), FrameManager::Get()->GLRCProcess(1, nullptr),
                                   wxDefaultPosition, wxDefaultSize);
         canvas_->Init();
         frame_->Show();
