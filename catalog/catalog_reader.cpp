@@ -36,20 +36,43 @@ void CatalogReader::Setplaylist()
     if (last >= 0)
         m_catalog->SpanCount = static_cast<std::uint16_t>(last - first + 1);
     m_recordCount = 0;
+    m_rowPositions.clear();
+    m_rowPositions.reserve(kCatalogCapacity);
+    m_skippedPositions.clear();
     if (last < first || ringSize <= 0)
         return;
 
     // Negative positions are skipped without a read, so the walk starts at
-    // the first one that is not.
-    for (std::int64_t position = std::max<std::int64_t>(first, 0); position <= last; ++position) {
-        if (m_recordCount == kCatalogCapacity)
-            return;
+    // the first one that is not; positions repeat around the ring, so it
+    // lists each of them once. An entry damaged in both copies is passed
+    // over: it costs its own row, not the rows of the recordings after it.
+    const std::int64_t from = std::max<std::int64_t>(first, 0);
+    const std::int64_t to = std::min(last, from + ringSize - 1);
+    for (std::int64_t p = from; p <= to && m_recordCount < kCatalogCapacity; ++p) {
+        const std::int64_t position = p % ringSize;
         _HisiList_t record{};
-        if (BlockOpe(m_diskFile, 33, &record, position % ringSize, 1) < 0)
-            return;  // the entries made so far stay
+        if (BlockOpe(m_diskFile, 33, &record, position, 1) < 0) {
+            m_skippedPositions.push_back(static_cast<std::int32_t>(position));
+            continue;
+        }
         FillEntry(m_catalog->Entries[m_recordCount], record);
+        m_rowPositions.push_back(static_cast<std::int32_t>(position));
         ++m_recordCount;
     }
+    CollectSkippedPositions();
+}
+
+// Adds the damaged entries the adapter refresh met at either end of the
+// recorder's span: the refresh narrowed the span to its readable entries, so
+// the walk above never reaches them, but they are recordings all the same.
+void CatalogReader::CollectSkippedPositions()
+{
+    const std::vector<std::int32_t>& unreadable = m_volume->unreadableListPositions;
+    m_skippedPositions.reserve(m_skippedPositions.size() + unreadable.size());
+    m_skippedPositions.insert(m_skippedPositions.end(), unreadable.begin(), unreadable.end());
+    std::sort(m_skippedPositions.begin(), m_skippedPositions.end());
+    m_skippedPositions.erase(std::unique(m_skippedPositions.begin(), m_skippedPositions.end()),
+                             m_skippedPositions.end());
 }
 
 namespace {

@@ -5,6 +5,7 @@
 #define CATALOG_CATALOG_READER_H
 
 #include <cstdint>
+#include <vector>
 
 #include <wx/string.h>
 
@@ -30,9 +31,15 @@ public:
     void Setplaylist();
 
     std::int32_t m_recordCount = 0;  // entries 0 .. m_recordCount - 1 are valid
+    // The list position each valid entry was read from.
+    std::vector<std::int32_t> m_rowPositions;
+    // List positions of the recorder's span whose entry could be read in
+    // neither copy, and so has no row: ascending, each once.
+    std::vector<std::int32_t> m_skippedPositions;
 
 private:
     void FillEntry(CatalogEntry& entry, const _HisiList_t& record);
+    void CollectSkippedPositions();
 };
 
 #endif

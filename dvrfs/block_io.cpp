@@ -10,6 +10,7 @@
 
 #include "dvrfs/dvr_disk_reader.h"
 #include "dvrfs/error_places.h"
+#include "dvrfs/record_math.h"
 
 using namespace dvrfs;
 
@@ -83,6 +84,10 @@ int DvrDiskReader::BlockRead(wxFile* file, wxInt64 position, char* dest, int len
 
     // One device read per logical block touched: the device results are not
     // looked at, the XOR sums of the records read are what catch a bad read.
+    // Cleared first, so that a piece the device does not deliver fails the
+    // record's sum instead of passing off what the buffer held before; a read
+    // refused above leaves the buffer as it was.
+    ClearRecords(dest, length);
     wxInt64 inside = position & super.BlockMask;
     wxInt64 remaining = length;
     for (wxInt64 block = position >> super.BlockSizeShift; block <= last; ++block) {

@@ -29,6 +29,8 @@ enum DvrErrorCode : std::int32_t {
     kErrNotReady = 38,         // no open volume, or no current adapter
     kErrGeometry = 39,         // block size, mask and shift disagree or are out of range
     kErrTableSize = 40,        // block table larger than the reader accepts
+    kErrBackupSuperBlock = 41, // primary superblock damaged: the volume opened on the backup copy
+    kErrBackupBlockTable = 42, // primary block table damaged: the volume opened on the backup copy
     kErrListEntry = 50,        // list entry fails its XOR sum in the list ring
     kErrBlockHeader = 52,      // data block header fails its XOR sum
     kErrIndexEntry = 53,       // index entry fails its XOR sum
@@ -42,8 +44,7 @@ enum DvrErrorCode : std::int32_t {
     kErrPayloadNegative = 73,
     kErrPayloadBeyond = 74,
     kErrAdapter = 81,          // the chosen adapter slot is not valid when read again
-    kErrAdapterRings = 82,     // the adapter's rings do not fit the block space
-    kErrListSpan = 83,         // the adapter's list span is longer than its ring
+    kErrAdapterRings = 82,     // the adapter's rings are larger than the reader accepts
     kErrRingEmpty = 84,        // the data ring has no blocks to relate to
 };
 
@@ -73,6 +74,9 @@ public:
     int Checkconfig();
     wxInt64 GetInfo(char selector);
     int Checksum(char* data, int n);
+    // The checks a verified superblock's values must pass before the volume
+    // uses them (table limit, block geometry); -1 with the register's code.
+    int CheckSuperBlockValues();
 
     // Raw reads at physical offsets and logical positions.
     int HddataRead(wxFile* file, char* dest, wxUint64 offset, unsigned long length);
@@ -120,6 +124,7 @@ private:
         __attribute__((format(printf, 3, 4)));
 
     // Volume open.
+    int LoadSuperBlock(wxFile* file);
     int LoadPrimarySuperBlock(wxFile* file);
     int LoadBackupSuperBlock(wxFile* file);
     int VerifySuperBlock();
@@ -132,9 +137,10 @@ private:
 
     // Index walk.
     int SearchAdapter(wxFile* file);
-    bool AdapterRingsFit(const _HisiAdapter_t& adapter) const;
+    bool AdapterRingsWithinLimits(const _HisiAdapter_t& adapter) const;
     bool AdapterSlotIsValid(const _HisiAdapter_t& slot, int number);
-    int RefreshAdapter(wxFile* file, wxInt64 first, int count);
+    int RefreshAdapter(wxFile* file, wxInt64 first, wxInt64 count);
+    void SummariseListSpan(wxFile* file, wxInt64 first, wxInt64 count);
     int RefreshNewestBlockHeader(wxFile* file);
     int RefreshNewestFrame(wxFile* file);
     int DumpAdapter();

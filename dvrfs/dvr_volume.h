@@ -3,20 +3,24 @@
 #define DVRFS_DVR_VOLUME_H
 
 #include <array>
+#include <cstdint>
 #include <memory>
 #include <vector>
 
 #include "dvrfs/dvrfs_records.h"
 
 struct DvrVolume {
-    // Copy of the superblock that was loaded last (primary, or backup on the
-    // way back to the primary).
+    // Copy of the superblock in use: the primary, or the backup copy when
+    // the primary or its block table is damaged.
     _H264SuperBlock_t superBlock{};
     // BlockTableCount + 1 entries, zero-filled before loading; the extra entry
     // stays zero. Empty until a superblock has been loaded.
     std::vector<_H264BlockTable_t> blockTable;
     // The current adapter; null until the adapter search succeeds.
     std::unique_ptr<_HisiAdapter_t> adapter;
+    // List positions of the adapter's span that the adapter refresh could read
+    // in neither the list ring nor its mirror, in the order it met them.
+    std::vector<std::int32_t> unreadableListPositions;
     // The second partition slot of sector 0; null until the device opens.
     std::unique_ptr<std::array<char, kPartitionSlotSize>> partitionEntry;
 };

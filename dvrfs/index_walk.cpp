@@ -7,6 +7,7 @@
 #include <cinttypes>
 #include <climits>
 #include <cstdio>
+#include <vector>
 
 #include "dvrfs/dvr_disk_reader.h"
 #include "dvrfs/error_places.h"
@@ -56,24 +57,12 @@ bool DvrDiskReader::AdapterSlotIsValid(const _HisiAdapter_t& slot, int number)
            Checksum(const_cast<char*>(reinterpret_cast<const char*>(&slot)), kAdapterSize) == 0;
 }
 
-// The list ring, its mirror and the data ring must lie inside the block space,
-// and within the sizes the reader accepts, before anything walks them.
-bool DvrDiskReader::AdapterRingsFit(const _HisiAdapter_t& adapter) const
+// Ring sizes the reader accepts: enough for any recorder, small enough that
+// no adapter makes a walk or an allocation unbounded. Where the rings lie is
+// not judged here: a read beyond the block space is refused on its own.
+bool DvrDiskReader::AdapterRingsWithinLimits(const _HisiAdapter_t& adapter) const
 {
-    if (adapter.ListMax > kMaxListMax || adapter.DataBlockMax > kMaxDataBlockMax)
-        return false;
-    const _H264SuperBlock_t& super = m_volume->superBlock;
-    const wxInt64 space = static_cast<wxInt64>(super.BlockCount) * super.BlockSize;
-    auto fits = [space](wxUint64 offset, wxInt64 count, wxInt64 stride) {
-        if (count <= 0)
-            return true;  // an empty ring occupies nothing
-        if (space <= 0 || offset > static_cast<wxUint64>(space))
-            return false;
-        return static_cast<wxUint64>(count * stride) <= static_cast<wxUint64>(space) - offset;
-    };
-    return fits(adapter.ListOffset, adapter.ListMax, kListEntrySize) &&
-           fits(adapter.ListOffsetBackup, adapter.ListMax, kListEntrySize) &&
-           fits(adapter.DataBlockOffset, adapter.DataBlockMax, kDataBlockSize);
+    return adapter.ListMax <= kMaxListMax && adapter.DataBlockMax <= kMaxDataBlockMax;
 }
 
 // The current adapter is the end of the first run of valid slots, scanning
@@ -88,7 +77,6 @@ int DvrDiskReader::SearchAdapter(wxFile* file)
     int chosen = -1;
     for (int i = 0; i < 2 * kAdapterSlotCount; ++i) {
         const int slot = i % kAdapterSlotCount;
-        ClearRecords(Bytes(candidate.get()), kAdapterSize);
         if (BlockRead(file, slot * slotStride, Bytes(candidate.get()), kAdapterSize) < 0)
             return -1;
         if (AdapterSlotIsValid(*candidate, slot))
@@ -98,14 +86,14 @@ int DvrDiskReader::SearchAdapter(wxFile* file)
     }
 
     // With no valid slot the position is negative and the read refuses it.
-    ClearRecords(Bytes(candidate.get()), kAdapterSize);
     if (BlockRead(file, chosen * slotStride, Bytes(candidate.get()), kAdapterSize) < 0)
         return -1;
     if (!AdapterSlotIsValid(*candidate, chosen))
         return Refuse(kErrAdapter, kAtAdapter);
-    if (!AdapterRingsFit(*candidate))
+    if (!AdapterRingsWithinLimits(*candidate))
         return Refuse(kErrAdapterRings, kAtAdapterRings);
     m_volume->adapter = std::move(candidate);
+    m_volume->unreadableListPositions.clear();
 
     const _HisiAdapter_t& adapter = *m_volume->adapter;
     if (adapter.LastList.Idx < 0)
@@ -114,44 +102,19 @@ int DvrDiskReader::SearchAdapter(wxFile* file)
     wxInt64 last = adapter.LastList.Idx;
     if (last < first)
         last += adapter.ListMax;
-    const wxInt64 span = last - first + 1;
-    if (span > INT_MAX)
-        return Refuse(kErrListSpan, kAtListSpan);
-    return RefreshAdapter(file, first, static_cast<int>(span)) < 0 ? -1 : 1;
+    return RefreshAdapter(file, first, last - first + 1) < 0 ? -1 : 1;
 }
 
 // Rebuilds the adapter's summary from list entries first .. first + count - 1
 // (around the ring): oldest and newest readable entry, earliest start, latest
 // end, then the newest readable data block header and index entry.
-int DvrDiskReader::RefreshAdapter(wxFile* file, wxInt64 first, int count)
+int DvrDiskReader::RefreshAdapter(wxFile* file, wxInt64 first, wxInt64 count)
 {
     if (!HasAdapter())
         return -1;
     _HisiAdapter_t& adapter = *m_volume->adapter;
-    // A span longer than the ring would visit entries again and again.
-    if (adapter.ListMax > 0 && count > adapter.ListMax)
-        return Refuse(kErrListSpan, kAtListSpan);
-    _HisiList_t entry{};
-    if (ReadListEntries(file, first, 1, Bytes(&entry)) < 0)
-        return -1;
-
-    wxInt64 oldest = -1;
-    wxInt64 newest = -1;
-    for (int k = 0; k < count; ++k) {
-        const wxInt64 position = ReduceInRing(first + k, adapter.ListMax);
-        if (ReadListEntries(file, position, 1, Bytes(&entry)) < 0)
-            continue;
-        if (oldest == -1) {
-            oldest = position;
-            adapter.StartTime = entry.StartTime;
-            adapter.EndTime = entry.EndTime;
-        }
-        newest = position;
-        adapter.StartTime = std::min(adapter.StartTime, entry.StartTime);
-        adapter.EndTime = std::max(adapter.EndTime, entry.EndTime);
-    }
-    adapter.FirstList.Idx = static_cast<std::int32_t>(oldest);
-    adapter.LastList.Idx = static_cast<std::int32_t>(newest);
+    SummariseListSpan(file, first, count);
+    // With no readable entry the oldest is -1, and reading it fails.
     if (ReadListEntries(file, adapter.FirstList.Idx, 1, Bytes(&adapter.FirstList)) < 0 ||
         ReadListEntries(file, adapter.LastList.Idx, 1, Bytes(&adapter.LastList)) < 0)
         return -1;
@@ -161,6 +124,61 @@ int DvrDiskReader::RefreshAdapter(wxFile* file, wxInt64 first, int count)
     if (adapter.LastFrame.FrameInfo < 0)
         return 1;  // the adapter records no frame
     return RefreshNewestFrame(file);
+}
+
+// Walks the span's list positions and sets the adapter's oldest and newest
+// readable position and its earliest start and latest end. An entry that
+// cannot be read in either copy is passed over and remembered, so one
+// damaged entry costs one recording, not the span. Negative positions are
+// refused without a read, so the walk starts at the first one that is not.
+// Positions repeat around the ring: a span longer than the ring is walked
+// one turn, and its newest readable position is the last readable one of the
+// span's final turn, known from that one turn without reading again.
+void DvrDiskReader::SummariseListSpan(wxFile* file, wxInt64 first, wxInt64 count)
+{
+    _HisiAdapter_t& adapter = *m_volume->adapter;
+    std::vector<std::int32_t>& unreadable = m_volume->unreadableListPositions;
+    unreadable.clear();
+    const wxInt64 ringSize = adapter.ListMax;
+    wxInt64 oldest = -1;
+    wxInt64 newest = -1;
+    wxInt64 last = 0;
+    const wxInt64 start = std::max<wxInt64>(first, 0);
+    if (count > 0 && !__builtin_add_overflow(first, count - 1, &last) && last >= start) {
+        const wxInt64 positions = last - start + 1;
+        // An empty ring refuses every position the same way: one try says so.
+        const wxInt64 turn = std::min<wxInt64>(positions, ringSize > 0 ? ringSize : 1);
+        const bool severalTurns = ringSize > 0 && positions > ringSize;
+        std::vector<bool> readable(severalTurns ? static_cast<std::size_t>(ringSize) : 0);
+        _HisiList_t entry{};
+        for (wxInt64 k = 0; k < turn; ++k) {
+            const wxInt64 position = ReduceInRing(start + k, ringSize);
+            if (ReadListEntries(file, position, 1, Bytes(&entry)) < 0) {
+                if (position <= INT32_MAX)  // only a caller's stray position is larger
+                    unreadable.push_back(static_cast<std::int32_t>(position));
+                continue;
+            }
+            if (oldest == -1) {
+                oldest = position;
+                adapter.StartTime = entry.StartTime;
+                adapter.EndTime = entry.EndTime;
+            }
+            newest = position;
+            adapter.StartTime = std::min(adapter.StartTime, entry.StartTime);
+            adapter.EndTime = std::max(adapter.EndTime, entry.EndTime);
+            if (severalTurns)
+                readable[static_cast<std::size_t>(position)] = true;
+        }
+        if (severalTurns) {
+            newest = -1;
+            for (wxInt64 k = last; k > last - ringSize && newest == -1; --k) {
+                if (readable[static_cast<std::size_t>(k % ringSize)])
+                    newest = k % ringSize;
+            }
+        }
+    }
+    adapter.FirstList.Idx = static_cast<std::int32_t>(oldest);
+    adapter.LastList.Idx = static_cast<std::int32_t>(newest);
 }
 
 // Reads the header of the newest recording's last block; when that is
@@ -221,7 +239,6 @@ int DvrDiskReader::ReadListEntries(wxFile* file, wxInt64 index, int count, char*
     if (index + count > adapter.ListMax)
         return Refuse(kErrListBeyond, kAtListBeyond);
     const int bytes = RecordBytes(count, kListEntrySize);
-    ClearRecords(buffer, bytes);
     if (BlockRead(file, RecordPosition(adapter.ListOffset, index, kListEntrySize, 0), buffer, bytes) < 0)
         return -1;
     for (int j = 0; j < count; ++j) {
@@ -230,7 +247,6 @@ int DvrDiskReader::ReadListEntries(wxFile* file, wxInt64 index, int count, char*
             continue;
         // Damaged in the ring: take the mirror copy; code 50 stays either way.
         SetError(kErrListEntry, kAtListEntry);
-        ClearRecords(entry, kListEntrySize);
         if (BlockRead(file, RecordPosition(adapter.ListOffsetBackup, index + j, kListEntrySize, 0), entry,
                       kListEntrySize) < 0)
             return -1;
@@ -252,7 +268,6 @@ int DvrDiskReader::ReadBlockHeaders(wxFile* file, wxInt64 block, int count, char
         return Refuse(kErrBlockBeyond, kAtBlockBeyond);
     for (int j = 0; j < count; ++j) {
         char* header = buffer + static_cast<wxInt64>(j) * kBlockHeaderSize;
-        ClearRecords(header, kBlockHeaderSize);
         if (BlockRead(file, RecordPosition(adapter.DataBlockOffset, block + j, kDataBlockSize, 0), header,
                       kBlockHeaderSize) < 0)
             return -1;
@@ -280,7 +295,6 @@ int DvrDiskReader::ReadIndexEntries(wxFile* file, wxInt64 block, wxInt64 first, 
             ? -1
             : RecordPosition(adapter.DataBlockOffset, nextBlock, kDataBlockSize, -(first + count) * kIndexEntrySize);
     const int bytes = RecordBytes(count, kIndexEntrySize);
-    ClearRecords(buffer, bytes);
     if (BlockRead(file, position, buffer, bytes) < 0)
         return -1;
     for (wxInt64 j = 0; j < count; ++j) {

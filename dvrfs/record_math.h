@@ -46,9 +46,7 @@ inline char* Bytes(void* record)
     return static_cast<char*>(record);
 }
 
-// Clears a record's buffer before it is read. A piece of a read that the
-// device does not deliver is left as it was; cleared, it fails the record's
-// XOR sum instead of passing off what the buffer held before as the record.
+// Clears the buffer a read is about to fill.
 inline void ClearRecords(char* buffer, int bytes)
 {
     if (buffer && bytes > 0)

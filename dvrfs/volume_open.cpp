@@ -77,25 +77,38 @@ int DvrDiskReader::OpenDVRFS(wxString path)
     m_catalog->Opened2 = 1;
 
     Getpartition(m_diskFile);
-
-    if (SuperBlockOpe(m_diskFile, 3, nullptr) < 0) {
-        if (SuperBlockOpe(m_diskFile, 5, nullptr) < 0 || SuperBlockOpe(m_diskFile, 3, nullptr) < 0) {
-            CloseDVRFS();
-            return 0;
-        }
+    if (LoadSuperBlock(m_diskFile) < 0) {
+        CloseDVRFS();
+        return 0;
     }
+    return 1;
+}
 
+// The primary copy when it is sound, else the backup copy when that is: the
+// backup exists so that one damaged sector does not lose the disk. The
+// register then says which part of the primary copy was damaged.
+int DvrDiskReader::LoadSuperBlock(wxFile* file)
+{
+    if (SuperBlockOpe(file, 3, nullptr) >= 0 && CheckSuperBlockValues() >= 0)
+        return 1;
+    const bool onlyTableDamaged = m_errorCode == kErrBlockTable || m_errorCode == kErrTableSize;
+    if (SuperBlockOpe(file, 5, nullptr) < 0 || CheckSuperBlockValues() < 0)
+        return -1;
+    if (onlyTableDamaged)
+        SetError(kErrBackupBlockTable, kAtBackupBlockTable);
+    else
+        SetError(kErrBackupSuperBlock, kAtBackupSuperBlock);
+    return 1;
+}
+
+// What the reader needs of a verified superblock's values before it uses them.
+int DvrDiskReader::CheckSuperBlockValues()
+{
     const _H264SuperBlock_t& super = m_volume->superBlock;
-    if (super.TableLimit > super.TableLimitBound) {
-        SetError(kErrTableLimit, kAtTableLimit);
-        CloseDVRFS();
-        return 0;
-    }
-    if (!GeometryIsSound()) {
-        RefuseUnsoundGeometry();
-        CloseDVRFS();
-        return 0;
-    }
+    if (super.TableLimit > super.TableLimitBound)
+        return Refuse(kErrTableLimit, kAtTableLimit);
+    if (!GeometryIsSound())
+        return RefuseUnsoundGeometry();
     return 1;
 }
 

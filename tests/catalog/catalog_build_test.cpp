@@ -6,6 +6,7 @@
 #include "catalog/catalog_reader.h"
 #include "tests/support/disk_fixture.h"
 #include "tests/support/io_trace.h"
+#include "tools/dvrfs/disk_check.h"
 
 namespace {
 
@@ -77,19 +78,104 @@ TEST_F(CatalogBuildTest, SingleRecording)
     EXPECT_EQ(catalog_.m_catalog->SpanCount, 1);
 }
 
-TEST_F(CatalogBuildTest, EntryDamagedInBothCopiesEndsTheWalkThere)
+struct DamagedListCase {
+    const char* name;
+    std::vector<int> damagedBoth;        // list positions damaged in ring and mirror
+    std::vector<int> damagedRing;        // damaged in the ring only: repaired from the mirror
+    std::vector<int> rows;               // the Idx of each row, in order
+    std::vector<std::int32_t> skipped;
+    int spanCount;
+};
+
+void PrintTo(const DamagedListCase& c, std::ostream* out)
 {
-    const std::string path = WriteDisk({0, 1, 2, 3, 4});
-    image_->Damage(Target::ListEntry, 2);
-    image_->Damage(Target::ListMirror, 2);
-    image_->Damage(Target::ListEntry, 1);  // repaired from the mirror
+    *out << c.name;
+}
+
+class DamagedListTest : public CatalogBuildTest, public ::testing::WithParamInterface<DamagedListCase> {};
+
+// Twelve recordings, each in a data block of its own. An entry unreadable in
+// both copies costs its own row only, wherever it lies in the span, and is
+// named among the skipped positions; the rows after it keep their entries.
+TEST_P(DamagedListTest, DamagedEntryCostsOnlyItsOwnRow)
+{
+    Layout layout = SmallLayout();
+    layout.dataBlockMax = 16;
+    image_ = std::make_unique<DiskImage>(layout);
+    for (int i = 0; i < 12; ++i)
+        image_->Add(GeneratedRecording(i, i, i, 1000 * i, 1000 * i + 500, 16, 2, 64));
+    const std::string path = WriteImage(*image_);
+    for (int p : GetParam().damagedBoth) {
+        image_->Damage(Target::ListEntry, p);
+        image_->Damage(Target::ListMirror, p);
+    }
+    for (int p : GetParam().damagedRing)
+        image_->Damage(Target::ListEntry, p);
     Refingerprint(path);
 
     ASSERT_EQ(Build(path), CatalogBuild::kBuilt);
-    EXPECT_EQ(Indices(), (std::vector<int>{0, 1}));
-    EXPECT_EQ(catalog_.m_catalog->SpanCount, 5);
+    EXPECT_EQ(Indices(), GetParam().rows);
+    EXPECT_EQ(catalog_.m_skippedPositions, GetParam().skipped);
+    EXPECT_EQ(catalog_.m_catalog->SpanCount, GetParam().spanCount);
     EXPECT_EQ(catalog_.m_errorCode, 50);
+
+    // Each row plays and extracts its own entry's recording.
+    for (int row = 0; row < catalog_.m_recordCount; ++row) {
+        const int idx = GetParam().rows[static_cast<std::size_t>(row)];
+        _HisiList_t recording{};
+        ASSERT_TRUE(dvrfstool::RecordingOfRow(catalog_, row, &recording));
+        EXPECT_EQ(recording.Idx, idx);
+        std::vector<unsigned char> stream;
+        dvrfstool::ExtractRecording(catalog_, recording, [&stream](const unsigned char* data, std::size_t size) {
+            stream.insert(stream.end(), data, data + size);
+            return true;
+        });
+        std::vector<std::uint8_t> expected = dvrimage::PatternPayload(idx, 0, 64);
+        const std::vector<std::uint8_t> second = dvrimage::PatternPayload(idx, 1, 64);
+        expected.insert(expected.end(), second.begin(), second.end());
+        EXPECT_EQ(stream, expected) << "row " << row;
+    }
 }
+
+INSTANTIATE_TEST_SUITE_P(
+    Lists, DamagedListTest,
+    ::testing::Values(DamagedListCase{"ThirdAndSeventh", {2, 6}, {4}, {0, 1, 3, 4, 5, 7, 8, 9, 10, 11}, {2, 6}, 12},
+                      DamagedListCase{"OldestAndNewest", {0, 11}, {}, {1, 2, 3, 4, 5, 6, 7, 8, 9, 10}, {0, 11}, 10}),
+    [](const ::testing::TestParamInfo<DamagedListCase>& info) { return std::string(info.param.name); });
+
+struct OddAdapterCase {
+    const char* name;
+    void (*change)(Layout&);
+};
+
+void PrintTo(const OddAdapterCase& c, std::ostream* out)
+{
+    *out << c.name;
+}
+
+class OddAdapterTest : public CatalogBuildTest, public ::testing::WithParamInterface<OddAdapterCase> {};
+
+// Adapters whose declared rings reach past the disk, or whose newest position
+// lies past the end of the list ring: what they describe can be read, so the
+// recordings are listed.
+TEST_P(OddAdapterTest, RecordingsThatCanBeReadAreListed)
+{
+    Layout layout = SmallLayout();
+    layout.blockCount = 40000;
+    GetParam().change(layout);
+    const std::string path = WriteDisk({0, 1}, layout);
+    ASSERT_EQ(Build(path), CatalogBuild::kBuilt);
+    EXPECT_EQ(Indices(), (std::vector<int>{0, 1}));
+}
+
+INSTANTIATE_TEST_SUITE_P(
+    Adapters, OddAdapterTest,
+    ::testing::Values(
+        OddAdapterCase{"DataRingLargerThanTheDisk", [](Layout& l) { l.dataBlockMax = 10; }},
+        OddAdapterCase{"MirrorBeyondTheDisk",
+                       [](Layout& l) { l.listOffsetBackup = 40000ull * 4096, l.dataBlockOffset = 1 << 20; }},
+        OddAdapterCase{"NewestPositionBeyondTheRing", [](Layout& l) { l.lastListIdx = 16 + 1; }}),
+    [](const ::testing::TestParamInfo<OddAdapterCase>& info) { return std::string(info.param.name); });
 
 TEST_F(CatalogBuildTest, NegativePositionsAreSkippedWithoutAReadAndAHugeSpanIsCutTo16Bits)
 {

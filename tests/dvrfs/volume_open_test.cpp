@@ -91,41 +91,60 @@ TEST_F(VolumeOpenTest, AllZeroDiskFailsOnHeaderSizeAfterTryingTheBackupAtOffsetZ
     EXPECT_EQ(reader_.m_catalog->Opened, 1);
 }
 
-TEST_F(VolumeOpenTest, DamagedPrimaryIsRefusedEvenWhenTheBackupVerifies)
+struct CopyDamageCase {
+    const char* name;
+    std::vector<Target> damaged;
+    int opened;
+    std::int32_t code;
+    const char* text;
+};
+
+void PrintTo(const CopyDamageCase& c, std::ostream* out)
+{
+    *out << c.name;
+}
+
+class CopyDamageTest : public DiskTest, public ::testing::WithParamInterface<CopyDamageCase> {};
+
+// A sound primary copy is used as it is; a damaged one gives way to a sound
+// backup, and the register says which part of the primary was damaged.
+TEST_P(CopyDamageTest, OpensOnTheFirstSoundCopy)
+{
+    DiskImage image(SmallLayout());
+    const std::string path = WriteImage(image);
+    for (Target target : GetParam().damaged)
+        image.Damage(target);
+    Refingerprint(path);
+
+    EXPECT_EQ(Open(path), GetParam().opened);
+    EXPECT_EQ(reader_.m_errorCode, GetParam().code);
+    EXPECT_EQ(ErrorText(), GetParam().text);
+    EXPECT_EQ(reader_.m_volume != nullptr, GetParam().opened == 1);
+    EXPECT_EQ(reader_.m_diskFile != nullptr, GetParam().opened == 1);
+}
+
+INSTANTIATE_TEST_SUITE_P(
+    Copies, CopyDamageTest,
+    ::testing::Values(
+        CopyDamageCase{"BackupDamaged", {Target::BackupSuperBlock, Target::BackupBlockTable}, 1, 0, ""},
+        CopyDamageCase{"PrimarySuperBlock", {Target::PrimarySuperBlock}, 1, 41, "FUNCTION[945]"},
+        CopyDamageCase{"PrimaryTable", {Target::PrimaryBlockTable}, 1, 42, "FUNCTION[946]"},
+        CopyDamageCase{"BothSuperBlocks", {Target::PrimarySuperBlock, Target::BackupSuperBlock}, 0, 33, ""},
+        CopyDamageCase{"BothTables", {Target::PrimaryBlockTable, Target::BackupBlockTable}, 0, 34,
+                       "FUNCTION[934]"}),
+    [](const ::testing::TestParamInfo<CopyDamageCase>& info) { return std::string(info.param.name); });
+
+TEST_F(VolumeOpenTest, BackupCopyInUseIsNotLeftForThePrimaryAgain)
 {
     DiskImage image(SmallLayout());
     const std::string path = WriteImage(image);
     image.Damage(Target::PrimarySuperBlock);
     Refingerprint(path);
 
-    EXPECT_EQ(Open(path), 0);
-    EXPECT_EQ(reader_.m_errorCode, 33);
-    // Partition slot, primary, backup and its table, primary once more.
-    EXPECT_EQ(ReadOffsets(path), (std::vector<std::int64_t>{0, 0, kBackup, kBackup + 8192, 0}));
-    EXPECT_EQ(reader_.m_volume, nullptr);
-    EXPECT_EQ(reader_.m_diskFile, nullptr);
-}
-
-TEST_F(VolumeOpenTest, DamagedBackupAloneDoesNotMatter)
-{
-    DiskImage image(SmallLayout());
-    const std::string path = WriteImage(image);
-    image.Damage(Target::BackupSuperBlock);
-    image.Damage(Target::BackupBlockTable);
-    Refingerprint(path);
-    EXPECT_EQ(Open(path), 1);
-}
-
-TEST_F(VolumeOpenTest, DamagedPrimaryTableFailsWithItsCode)
-{
-    DiskImage image(SmallLayout());
-    const std::string path = WriteImage(image);
-    image.Damage(Target::PrimaryBlockTable);
-    Refingerprint(path);
-
-    EXPECT_EQ(Open(path), 0);
-    EXPECT_EQ(reader_.m_errorCode, 34);
-    EXPECT_EQ(ErrorText(), "FUNCTION[934]");
+    ASSERT_EQ(Open(path), 1);
+    // Partition slot, primary, then the backup and its table, and no more.
+    EXPECT_EQ(ReadOffsets(path), (std::vector<std::int64_t>{0, 0, kBackup, kBackup + 8192}));
+    EXPECT_EQ(OpenAndSearch(path), 1);
 }
 
 TEST_F(VolumeOpenTest, EmptyBlockTableOpensWithoutReadingOne)

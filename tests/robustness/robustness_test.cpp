@@ -147,7 +147,7 @@ TEST_F(RobustnessTest, ImageEndingInTheMiddleOfTheListStopsTheCatalogueThere)
     EXPECT_EQ(catalog_.m_recordCount, 0);
 }
 
-TEST_F(RobustnessTest, UnreadableSectorEndsTheCatalogueAtItsEntryAndSaysSo)
+TEST_F(RobustnessTest, UnreadableSectorCostsTheEntriesInItAndSaysSo)
 {
     DiskImage image(SmallLayout());
     for (int i = 0; i < 6; ++i)
@@ -156,12 +156,13 @@ TEST_F(RobustnessTest, UnreadableSectorEndsTheCatalogueAtItsEntryAndSaysSo)
     ASSERT_EQ(Build(path), CatalogBuild::kBuilt);
     ASSERT_EQ(catalog_.m_recordCount, 6);
 
-    // The sector of entry 4, in the ring and in the mirror, fails from now on:
-    // the next build sees entries 0 to 3 only.
+    // The sector of entries 4 and 5, in the ring and in the mirror, fails
+    // from now on: the next build lists entries 0 to 3 and names 4 and 5.
     iotrace::FailReads(path, static_cast<std::int64_t>(image.PhysicalOffset(image.ListOffset() + 4 * 128)), 1);
     iotrace::FailReads(path, static_cast<std::int64_t>(image.PhysicalOffset(image.ListOffsetBackup() + 4 * 128)), 1);
     EXPECT_EQ(Build(path), CatalogBuild::kBuilt);
     EXPECT_EQ(catalog_.m_recordCount, 4);
+    EXPECT_EQ(catalog_.m_skippedPositions, (std::vector<std::int32_t>{4, 5}));
     EXPECT_EQ(catalog_.m_errorCode, 50);
     EXPECT_STREQ(catalog_.m_errorText, "FUNCTION[1463]");
 }

@@ -41,6 +41,7 @@ block_table_count=4
 offset_block_space=1048576
 super_offset=0
 super_offset_backup=524288
+superblock_copy=primary
 adapter_slot=4
 adapter_version=1
 list_max=64
@@ -63,9 +64,12 @@ info_50=1014
 	DataBlock: Offset=507904, Max=8
 	StartTime=22:13:20(1700000000), EndTime=22:38:20(1700001500)" "$out"
 
-"$mkdvrfs" --damage primary-super "$work/bad.img" >/dev/null
+"$mkdvrfs" --damage primary-super "$work/primary.img" >/dev/null
+out=$("$dvrfs" info "$work/primary.img" | grep copy)
+check "info on a damaged primary superblock reads the backup" "superblock_copy=backup" "$out"
+"$mkdvrfs" --damage primary-super --damage backup-super "$work/bad.img" >/dev/null
 err=$("$dvrfs" info "$work/bad.img" 2>&1 >/dev/null)
-check "info on a damaged superblock" 1 $?
+check "info on two damaged superblocks" 1 $?
 check "info says why" "dvrfs: $work/bad.img: not a recorder disk: the superblock is damaged (code 33)" "$err"
 "$mkdvrfs" --version 0 "$work/blank.img" >/dev/null
 err=$("$dvrfs" info "$work/blank.img" 2>&1 >/dev/null)
@@ -86,14 +90,19 @@ check "list output" "$(printf '0\t62\t0\t86399\t1970/01/01 00:00:00-23:59:59
 1\t63\t1700000000\t1700003723\t2023/11/14 22:13:20-23:15:23
 2\t0\t951782400\t951868799\t2000/02/29 00:00:00-23:59:59')" "$out"
 out=$("$dvrfs" list "$work/list.img" --json)
-check "list --json" '{"span_count": 3, "recordings": [{"row": 0, "idx": 62, "start": 0, "end": 86399, "date": "1970/01/01", "time": "00:00:00-23:59:59"}, {"row": 1, "idx": 63, "start": 1700000000, "end": 1700003723, "date": "2023/11/14", "time": "22:13:20-23:15:23"}, {"row": 2, "idx": 0, "start": 951782400, "end": 951868799, "date": "2000/02/29", "time": "00:00:00-23:59:59"}], "error": {"code": 50, "text": "FUNCTION[1463]"}}' "$out"
+check "list --json" '{"span_count": 3, "recordings": [{"row": 0, "idx": 62, "start": 0, "end": 86399, "date": "1970/01/01", "time": "00:00:00-23:59:59"}, {"row": 1, "idx": 63, "start": 1700000000, "end": 1700003723, "date": "2023/11/14", "time": "22:13:20-23:15:23"}, {"row": 2, "idx": 0, "start": 951782400, "end": 951868799, "date": "2000/02/29", "time": "00:00:00-23:59:59"}], "skipped": [], "error": {"code": 50, "text": "FUNCTION[1463]"}}' "$out"
 "$mkdvrfs" --recording 5:0:0:100:200 "$work/one.img" >/dev/null
 out=$("$dvrfs" list "$work/one.img" --json)
-check "list --json of an untroubled disk" '{"span_count": 1, "recordings": [{"row": 0, "idx": 5, "start": 100, "end": 200, "date": "1970/01/01", "time": "00:01:40-00:03:20"}], "error": null}' "$out"
+check "list --json of an untroubled disk" '{"span_count": 1, "recordings": [{"row": 0, "idx": 5, "start": 100, "end": 200, "date": "1970/01/01", "time": "00:01:40-00:03:20"}], "skipped": [], "error": null}' "$out"
 "$mkdvrfs" --recording 0:0:0:100:200 --recording 1:1:1:300:400 --recording 2:2:2:500:600 \
   --damage list:1 --damage mirror:1 "$work/cut.img" >/dev/null
-out=$("$dvrfs" list "$work/cut.img")
-check "list stops at an entry damaged in both copies" "$(printf '0\t0\t100\t200\t1970/01/01 00:01:40-00:03:20')" "$out"
+out=$("$dvrfs" list "$work/cut.img" 2>"$work/skipped")
+check "list passes over an entry damaged in both copies" "$(printf '0\t0\t100\t200\t1970/01/01 00:01:40-00:03:20
+1\t2\t500\t600\t1970/01/01 00:08:20-00:10:00')" "$out"
+check "list names the entry it passed over" \
+  "dvrfs: 1 damaged recording entry skipped (list position 1)" "$(cat "$work/skipped")"
+out=$("$dvrfs" list "$work/cut.img" --json 2>/dev/null | grep -o '"skipped": \[[0-9, ]*\]')
+check "list --json names it too" '"skipped": [1]' "$out"
 "$dvrfs" list "$work/bad.img" >/dev/null 2>&1
 check "list of a damaged superblock" 1 $?
 "$mkdvrfs" --adapter-run 5:0 "$work/noadapter.img" >/dev/null
@@ -123,10 +132,15 @@ out=$("$dvrfs" verify "$work/table.img")
 check "verify of a damaged backup table" 3 $?
 check "verify reports the backup table" "damaged: backup block table
 summary: 124 records checked, 1 damaged, 0 repaired" "$out"
+out=$("$dvrfs" verify "$work/primary.img")
+check "verify of a damaged primary superblock goes on" 3 $?
+check "verify reports the primary superblock and the backup in use" "damaged: primary superblock
+summary: 123 records checked, 1 damaged, 0 repaired" "$out"
 out=$("$dvrfs" verify "$work/bad.img" 2>/dev/null)
-check "verify of a damaged primary superblock" 1 $?
-check "verify reports the primary superblock" "damaged: primary superblock
-summary: 0 records checked, 1 damaged, 0 repaired" "$out"
+check "verify of two damaged superblocks" 1 $?
+check "verify reports both superblocks" "damaged: primary superblock
+damaged: backup superblock
+summary: 2 records checked, 2 damaged, 0 repaired" "$out"
 
 # --- extract: frames from a file, across the end of the data ring
 for i in $(seq 1 300); do printf 'frame-%04d-' "$i"; done > "$work/frames.bin"

@@ -14,15 +14,10 @@ constexpr std::int32_t kMaxFramesInBlock = 262142;
 
 bool RecordingOfRow(CatalogReader& reader, int row, _HisiList_t* recording)
 {
-    if (row < 0 || row >= reader.m_recordCount || !reader.m_volume || !reader.m_volume->adapter)
+    if (row < 0 || row >= reader.m_recordCount || static_cast<std::size_t>(row) >= reader.m_rowPositions.size())
         return false;
-    // Row r was made from the r-th list position of the span that is not
-    // negative: the build stops at the first entry it cannot read.
-    const _HisiAdapter_t& adapter = *reader.m_volume->adapter;
-    if (adapter.ListMax <= 0)
-        return false;
-    const std::int64_t position = (std::max<std::int64_t>(adapter.FirstList.Idx, 0) + row) % adapter.ListMax;
-    return reader.BlockOpe(reader.m_diskFile, 33, recording, position, 1) > 0;
+    return reader.BlockOpe(reader.m_diskFile, 33, recording, reader.m_rowPositions[static_cast<std::size_t>(row)],
+                           1) > 0;
 }
 
 ExtractResult ExtractRecording(CatalogReader& reader, const _HisiList_t& recording,

@@ -58,8 +58,7 @@ const char* PlainWords(std::int32_t code)
     case kErrReadRange:
     case kErrReadBeyond: return "a record lies outside the disk";
     case kErrAdapter: return "no valid state record was found";
-    case kErrAdapterRings: return "the state record describes rings that do not fit the disk";
-    case kErrListSpan: return "the state record's list of recordings is inconsistent";
+    case kErrAdapterRings: return "the state record describes rings larger than any recorder's";
     case kErrListEntry:
     case kErrListNegative:
     case kErrListBeyond: return "a recording entry is damaged";
@@ -115,6 +114,8 @@ int Info(const char* disk, bool dump)
     std::printf("offset_block_space=%llu\n", static_cast<unsigned long long>(super.OffsetBlockSpace));
     std::printf("super_offset=%llu\n", static_cast<unsigned long long>(super.SuperOffset));
     std::printf("super_offset_backup=%llu\n", static_cast<unsigned long long>(super.SuperOffsetBackup));
+    const bool onBackup = reader.m_errorCode == kErrBackupSuperBlock || reader.m_errorCode == kErrBackupBlockTable;
+    std::printf("superblock_copy=%s\n", onBackup ? "backup" : "primary");
 
     if (reader.Checkconfig() <= 0)
         return NotConfigured(disk);
@@ -157,11 +158,26 @@ std::string JsonString(const char* text)
     return out + "\"";
 }
 
+// Says on standard error which entries of the disk's list have no row.
+void ReportSkipped(const CatalogReader& reader)
+{
+    const std::vector<std::int32_t>& skipped = reader.m_skippedPositions;
+    if (skipped.empty())
+        return;
+    std::string positions;
+    for (std::int32_t position : skipped)
+        positions += (positions.empty() ? "" : ", ") + std::to_string(position);
+    std::fflush(stdout);
+    std::fprintf(stderr, "dvrfs: %zu damaged recording entr%s skipped (list position%s %s)\n", skipped.size(),
+                 skipped.size() == 1 ? "y" : "ies", skipped.size() == 1 ? "" : "s", positions.c_str());
+}
+
 int List(const char* disk, bool json)
 {
     CatalogReader reader;
     if (const int status = BuildCatalog(reader, disk); status != kOk)
         return status;
+    ReportSkipped(reader);
     const RecordCatalog& catalog = *reader.m_catalog;
     if (!json) {
         for (int row = 0; row < reader.m_recordCount; ++row) {
@@ -179,6 +195,9 @@ int List(const char* disk, bool json)
                     static_cast<std::uint32_t>(e.EndTime), JsonString(e.DateText).c_str(),
                     JsonString(e.TimeText).c_str());
     }
+    std::printf("], \"skipped\": [");
+    for (std::size_t i = 0; i < reader.m_skippedPositions.size(); ++i)
+        std::printf("%s%d", i ? ", " : "", reader.m_skippedPositions[i]);
     if (reader.m_errorCode == kErrNone && reader.m_errorText[0] == '\0')
         std::printf("], \"error\": null}\n");
     else

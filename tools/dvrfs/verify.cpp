@@ -1,7 +1,10 @@
 // The verification walk: every structure of the disk read once, each record
 // checked by its XOR sum (and its bounds), each finding reported on a line.
 #include <algorithm>
+#include <cstdio>
 #include <vector>
+
+#include <wx/log.h>
 
 #include "tools/dvrfs/disk_check.h"
 
@@ -23,11 +26,13 @@ public:
         reader_.m_errorCode = kErrNone;
         reader_.m_errorText[0] = '\0';
         if (reader_.OpenDVRFS(path) <= 0) {
-            ReportRefusedPrimary();
+            // Neither copy opens: say what is wrong with each, if the device reads.
+            if (OpenWithoutVerifying(path))
+                CheckSuperBlockCopies();
+            reader_.CloseDVRFS();
             return result_;
         }
-        result_.checked += 2;  // the primary superblock and block table verified on opening
-        CheckBackupCopy();
+        CheckSuperBlockCopies();
         CheckAdapterSlots();
         if (reader_.Checkconfig() <= 0) {
             result_.stage = VerifyStage::kNotConfigured;
@@ -73,38 +78,48 @@ private:
                                  static_cast<int>(size)) > 0;
     }
 
-    void ReportRefusedPrimary()
+    // The device, opened as the volume open does, with an empty volume for
+    // the superblock loads to fill.
+    bool OpenWithoutVerifying(const wxString& path)
     {
-        switch (reader_.m_errorCode) {
-        case kErrSuperBlock:
-        case kErrTableLimit:
-        case kErrGeometry:
-            Damaged("primary superblock");
-            break;
-        case kErrBlockTable:
-        case kErrTableSize:
-            Damaged("primary block table");
-            break;
-        default:
-            break;  // the device itself did not open
-        }
+        reader_.m_diskFile = new wxFile;
+        reader_.m_volume = new DvrVolume;
+        wxLogNull quiet;
+        return reader_.m_diskFile->Open(path, wxFile::read);
     }
 
-    // Loads the backup copy, then the primary again, as the open does.
-    void CheckBackupCopy()
+    // Both copies of the superblock and block table, each checked as the
+    // volume open checks it; the copy in use and the register stay as the
+    // open left them. The backup is found from the primary copy, as the open
+    // finds it.
+    void CheckSuperBlockCopies()
+    {
+        DvrVolume& volume = *reader_.m_volume;
+        const _H264SuperBlock_t inUse = volume.superBlock;
+        const std::vector<_H264BlockTable_t> table = volume.blockTable;
+        const std::int32_t code = reader_.m_errorCode;
+        const std::string text = reader_.m_errorText;
+        CheckSuperBlockCopy("primary", 3);
+        CheckSuperBlockCopy("backup", 5);
+        volume.superBlock = inUse;
+        volume.blockTable = table;
+        reader_.m_errorCode = code;
+        std::snprintf(reader_.m_errorText, sizeof reader_.m_errorText, "%s", text.c_str());
+    }
+
+    void CheckSuperBlockCopy(const std::string& copy, char mode)
     {
         ++result_.checked;
-        if (reader_.SuperBlockOpe(File(), 5, nullptr) < 0) {
-            if (reader_.m_errorCode == kErrBlockTable || reader_.m_errorCode == kErrTableSize) {
-                ++result_.checked;
-                Damaged("backup block table");
-            } else {
-                Damaged("backup superblock");
-            }
-        } else {
-            ++result_.checked;
+        if (reader_.SuperBlockOpe(File(), mode, nullptr) >= 0 && reader_.CheckSuperBlockValues() >= 0) {
+            ++result_.checked;  // and its block table
+            return;
         }
-        reader_.SuperBlockOpe(File(), 3, nullptr);
+        if (reader_.m_errorCode == kErrBlockTable || reader_.m_errorCode == kErrTableSize) {
+            ++result_.checked;
+            Damaged(copy + " block table");
+        } else {
+            Damaged(copy + " superblock");
+        }
     }
 
     // A slot that carries its own number but fails its sum is damaged; a slot
