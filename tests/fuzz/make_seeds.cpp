@@ -95,6 +95,38 @@ int main(int argc, char** argv)
              i.Damage(Target::ListEntry, 1);
              i.Damage(Target::ListMirror, 1);
          }},
+        {"list-oldest-and-newest-both",
+         [] { return Small(); },
+         ThreeRecordings,
+         [](DiskImage& i) {
+             for (int p : {0, 2}) {
+                 i.Damage(Target::ListEntry, p);
+                 i.Damage(Target::ListMirror, p);
+             }
+         }},
+        {"span-past-the-ring",
+         [] {
+             Layout l = Small();
+             l.lastListIdx = 16 + 2;
+             return l;
+         },
+         ThreeRecordings, None},
+        {"mirror-beyond-the-disk",
+         [] {
+             Layout l = Small();
+             l.blockCount = 40000;
+             l.listOffsetBackup = 40000ull * 4096;
+             l.dataBlockOffset = 1 << 20;
+             return l;
+         },
+         ThreeRecordings, [](DiskImage& i) { i.Damage(Target::ListEntry, 1); }},
+        {"both-supers",
+         [] { return Small(); },
+         ThreeRecordings,
+         [](DiskImage& i) {
+             i.Damage(Target::PrimarySuperBlock);
+             i.Damage(Target::BackupSuperBlock);
+         }},
         {"block-header", [] { return Small(); }, ThreeRecordings, [](DiskImage& i) { i.Damage(Target::BlockHeader, 0); }},
         {"index-entry", [] { return Small(); }, ThreeRecordings, [](DiskImage& i) { i.Damage(Target::IndexEntry, 0, 1); }},
     };
