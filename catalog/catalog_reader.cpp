@@ -6,25 +6,41 @@
 
 CatalogBuild CatalogReader::BuildCatalog(const wxString& path)
 {
+    CatalogBuild result = CatalogBuild::kBuilt;
     if (OpenDVRFS(path) <= 0)
-        return CatalogBuild::kNotOpened;
-    if (Checkconfig() <= 0)
-        return CatalogBuild::kNotConfigured;
-    if (BlockOpe(m_diskFile, 2, nullptr, 0, 0) < 0)
-        return CatalogBuild::kNoAdapter;
+        result = CatalogBuild::kNotOpened;
+    else if (Checkconfig() <= 0)
+        result = CatalogBuild::kNotConfigured;
+    else if (BlockOpe(m_diskFile, 2, nullptr, 0, 0) < 0)
+        result = CatalogBuild::kNoAdapter;
+    if (result != CatalogBuild::kBuilt) {
+        ClearEntries();
+        return result;
+    }
     Setplaylist();
     return CatalogBuild::kBuilt;
 }
 
-void CatalogReader::Setplaylist()
+// Every entry unfilled and no row: the texts are left as they are.
+void CatalogReader::ClearEntries()
 {
-    if (!m_catalog || !m_volume || !m_volume->adapter)
+    m_recordCount = 0;
+    m_rowPositions.clear();
+    m_skippedPositions.clear();
+    if (!m_catalog)
         return;
     for (CatalogEntry& entry : m_catalog->Entries) {
         entry.Idx = -1;
         entry.StartTime = 0;
         entry.EndTime = 0;
     }
+}
+
+void CatalogReader::Setplaylist()
+{
+    if (!m_catalog || !m_volume || !m_volume->adapter)
+        return;
+    ClearEntries();
 
     // The list is a ring: a newest position below the oldest has wrapped.
     const _HisiAdapter_t& adapter = *m_volume->adapter;
@@ -35,10 +51,7 @@ void CatalogReader::Setplaylist()
         last += ringSize;
     if (last >= 0)
         m_catalog->SpanCount = static_cast<std::uint16_t>(last - first + 1);
-    m_recordCount = 0;
-    m_rowPositions.clear();
     m_rowPositions.reserve(kCatalogCapacity);
-    m_skippedPositions.clear();
     if (last < first || ringSize <= 0)
         return;
 

@@ -24,7 +24,8 @@ class CatalogReader : public DvrDiskReader {
 public:
     // Opens the disk, checks for a configured recorder, finds the current
     // adapter and fills the catalogue, in that order, stopping at the first
-    // step that fails. A build that stops leaves the catalogue as it was.
+    // step that fails. A build that stops empties the catalogue: what it held
+    // came from another disk, and must not be played as this one's.
     CatalogBuild BuildCatalog(const wxString& path);
 
     // Fills the catalogue from the open volume's list ring, oldest first.
@@ -38,6 +39,7 @@ public:
     std::vector<std::int32_t> m_skippedPositions;
 
 private:
+    void ClearEntries();
     void FillEntry(CatalogEntry& entry, const _HisiList_t& record);
     void CollectSkippedPositions();
 };

@@ -2,6 +2,7 @@
 // refill of the recording list from the catalogue.
 #include <wx/datetime.h>
 
+#include "catalog/build_summary.h"
 #include "controls/plug_list_ctrl.h"
 #include "panel/drive_discovery.h"
 #include "panel/morvane_plug_config.h"
@@ -18,11 +19,21 @@ wxString LocalDateTime(std::int32_t seconds)
 
 }  // namespace
 
+// A build that fails empties the catalogue, and so the list: rows of the
+// disk chosen before must not stand under this one's name.
 void MorvanePlugConfig::SendHddList(int drive)
 {
     m_diskPath = DiskPathForDrive(drive);
-    if (BuildCatalog(wxString(m_diskPath)) == CatalogBuild::kBuilt)
-        Setwxlist();
+    const CatalogBuild result = BuildCatalog(wxString(m_diskPath));
+    Setwxlist();
+    ShowBuildSummary(drive, result);
+}
+
+void MorvanePlugConfig::ShowBuildSummary(int drive, CatalogBuild result)
+{
+    const std::string summary = DescribeBuild(result, *this, m_diskPath.utf8_string());
+    m_statusLine->SetLabelText(wxString::Format("PHYSICALDRIVE%d (%s): %s", drive, m_diskPath,
+                                            wxString::FromUTF8(summary.c_str())));
 }
 
 void MorvanePlugConfig::Setwxlist()

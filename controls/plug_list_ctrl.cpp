@@ -44,7 +44,14 @@ void CPlugListCtrl::OnDeleteItem(wxListEvent&) {}
 void CPlugListCtrl::OnDeleteAllItems(wxListEvent&) {}
 void CPlugListCtrl::OnSelected(wxListEvent&) {}
 void CPlugListCtrl::OnDeselected(wxListEvent&) {}
-void CPlugListCtrl::OnListKeyDown(wxListEvent&) {}
+// The toolkit's own list does its keyboard work (moving through the rows,
+// Enter to activate one) only for a key the handler leaves unhandled; the
+// event still goes no further than this control.
+void CPlugListCtrl::OnListKeyDown(wxListEvent& event)
+{
+    event.StopPropagation();
+    event.Skip();
+}
 void CPlugListCtrl::OnFocused(wxListEvent&) {}
 void CPlugListCtrl::OnColClick(wxListEvent&) {}
 void CPlugListCtrl::OnColRightClick(wxListEvent&) {}

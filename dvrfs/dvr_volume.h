@@ -9,6 +9,13 @@
 
 #include "dvrfs/dvrfs_records.h"
 
+// Which copy of the superblock and block table the volume was opened on.
+enum class SuperBlockCopy {
+    kPrimary,
+    kBackupSuperBlock,  // the primary superblock is damaged
+    kBackupTable,       // the primary superblock is sound, its block table damaged
+};
+
 struct DvrVolume {
     // Copy of the superblock in use: the primary, or the backup copy when
     // the primary or its block table is damaged.
@@ -16,6 +23,7 @@ struct DvrVolume {
     // BlockTableCount + 1 entries, zero-filled before loading; the extra entry
     // stays zero. Empty until a superblock has been loaded.
     std::vector<_H264BlockTable_t> blockTable;
+    SuperBlockCopy copyInUse = SuperBlockCopy::kPrimary;
     // The current adapter; null until the adapter search succeeds.
     std::unique_ptr<_HisiAdapter_t> adapter;
     // List positions of the adapter's span that the adapter refresh could read

@@ -89,15 +89,19 @@ int DvrDiskReader::OpenDVRFS(wxString path)
 // register then says which part of the primary copy was damaged.
 int DvrDiskReader::LoadSuperBlock(wxFile* file)
 {
+    m_volume->copyInUse = SuperBlockCopy::kPrimary;
     if (SuperBlockOpe(file, 3, nullptr) >= 0 && CheckSuperBlockValues() >= 0)
         return 1;
     const bool onlyTableDamaged = m_errorCode == kErrBlockTable || m_errorCode == kErrTableSize;
     if (SuperBlockOpe(file, 5, nullptr) < 0 || CheckSuperBlockValues() < 0)
         return -1;
-    if (onlyTableDamaged)
+    if (onlyTableDamaged) {
+        m_volume->copyInUse = SuperBlockCopy::kBackupTable;
         SetError(kErrBackupBlockTable, kAtBackupBlockTable);
-    else
+    } else {
+        m_volume->copyInUse = SuperBlockCopy::kBackupSuperBlock;
         SetError(kErrBackupSuperBlock, kAtBackupSuperBlock);
+    }
     return 1;
 }
 

@@ -80,11 +80,15 @@ public:
     wxBitmapButton* m_btnReverse;
     wxBitmapButton* m_btnForward;
     wxBitmapButton* m_btnSwitch;
+    // One line under the transport buttons: what the chosen drive holds, or
+    // why it could not be read.
+    wxStaticText* m_statusLine;
 
 private:
     wxBitmapButton* MakeButton(int id, const wxString& image, const wxPoint& pos);
     void ConnectHandlers();
     void PlaceButtonRow(int y, int base);
+    void ShowBuildSummary(int drive, CatalogBuild result);
 
     // Playback shutdown shared by close and destruction; returns the address
     // of the connection record (0 when nothing played).

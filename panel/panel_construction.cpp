@@ -60,7 +60,8 @@ MorvanePlugConfig::MorvanePlugConfig(wxWindow* parent, MorvanePlugin* plugin, wx
       m_btnStop(nullptr),
       m_btnReverse(nullptr),
       m_btnForward(nullptr),
-      m_btnSwitch(nullptr)
+      m_btnSwitch(nullptr),
+      m_statusLine(nullptr)
 {
     m_dialog = new wxDialog(parent, wxID_ANY, Translated("Morvane"), wxDefaultPosition, wxSize(800, 600), kDialogStyle);
     m_dialog->SetBackgroundColour(wxColour(80, 58, 77, 255));
@@ -94,6 +95,9 @@ MorvanePlugConfig::MorvanePlugConfig(wxWindow* parent, MorvanePlugin* plugin, wx
     m_btnReverse = MakeButton(1031, "reverse", wxPoint(515, 530));
     m_btnForward = MakeButton(1032, "forward", wxPoint(555, 530));
     m_btnSwitch = MakeButton(1033, "sw", wxPoint(750, 530));
+    m_statusLine = new wxStaticText(m_dialog, wxID_ANY, wxString(), wxPoint(200, 566), wxSize(585, 20),
+                                    wxST_NO_AUTORESIZE | wxST_ELLIPSIZE_END);
+    m_statusLine->SetForegroundColour(wxColour(240, 240, 240, 255));
 
     SetDriverTrees();
     ConnectHandlers();
@@ -161,12 +165,14 @@ void MorvanePlugConfig::OnSize(wxSizeEvent& event)
             button->SetSize(x, 530, m_buttonSize.x, m_buttonSize.y, wxSIZE_AUTO);
             x += 40;
         }
+        m_statusLine->SetSize(200, 566, 585, 20, wxSIZE_AUTO);
         return;
     }
     m_recordList->SetSize(10, 70, 180, std::max(height - 110, 1), wxSIZE_AUTO);
     if (m_glPane)
         m_glPane->SetSize(200, 10, std::max(width - 215, 1), std::max(height - 100, 1), wxSIZE_AUTO);
     PlaceButtonRow(height - 70, (6 * width) / 16);
+    m_statusLine->SetSize(200, height - 34, std::max(width - 215, 1), 20, wxSIZE_AUTO);
 }
 
 void MorvanePlugConfig::PlaceButtonRow(int y, int base)

@@ -1,8 +1,12 @@
 // The catalogue build: the list ring walked from the oldest to the newest
 // recording into at most 8192 entries with their UTC texts.
+#include <filesystem>
+#include <fstream>
+#include <functional>
 #include <string>
 #include <vector>
 
+#include "catalog/build_summary.h"
 #include "catalog/catalog_reader.h"
 #include "tests/support/disk_fixture.h"
 #include "tests/support/io_trace.h"
@@ -239,7 +243,7 @@ TEST_F(CatalogBuildTest, TextsAreUtcDateAndClockTimes)
     EXPECT_STREQ(e[2].TimeText, "00:00:00-23:59:59");
 }
 
-TEST_F(CatalogBuildTest, SecondBuildReplacesTheFirstAndAFailedOneKeepsIt)
+TEST_F(CatalogBuildTest, SecondBuildReplacesTheFirstAndAFailedOneEmptiesIt)
 {
     const std::string first = WriteDisk({0, 1, 2, 3, 4}, SmallLayout(), "first.img");
     const std::string second = WriteDisk({7, 8}, SmallLayout(), "second.img");
@@ -254,7 +258,9 @@ TEST_F(CatalogBuildTest, SecondBuildReplacesTheFirstAndAFailedOneKeepsIt)
     EXPECT_STREQ(catalog->Entries[2].DateText, "1970/01/01");  // texts of the first build stay
 
     EXPECT_EQ(Build(dir_ + "/missing.img"), CatalogBuild::kNotOpened);
-    EXPECT_EQ(Indices(), (std::vector<int>{7, 8}));
+    EXPECT_EQ(Indices(), (std::vector<int>{}));
+    EXPECT_EQ(catalog->Entries[0].Idx, -1);
+    ASSERT_EQ(Build(second), CatalogBuild::kBuilt);
 
     Layout unconfigured = SmallLayout();
     unconfigured.version = 0;
@@ -264,7 +270,94 @@ TEST_F(CatalogBuildTest, SecondBuildReplacesTheFirstAndAFailedOneKeepsIt)
     noAdapter.adapterRuns.clear();
     DiskImage empty(noAdapter);
     EXPECT_EQ(Build(WriteImage(empty, "empty.img")), CatalogBuild::kNoAdapter);
-    EXPECT_EQ(Indices(), (std::vector<int>{7, 8}));
+    EXPECT_EQ(Indices(), (std::vector<int>{}));
 }
+
+}  // namespace
+
+namespace {
+
+struct SummaryCase {
+    const char* name;
+    std::function<std::string(const std::string& dir)> makeDisk;  // writes a disk, returns its path
+    std::string summary;
+};
+
+void PrintTo(const SummaryCase& c, std::ostream* out)
+{
+    *out << c.name;
+}
+
+std::string Written(DiskImage image, const std::string& path, const std::vector<std::pair<Target, int>>& damage)
+{
+    image.Write(path);
+    for (const auto& [target, a] : damage)
+        image.Damage(target, a);
+    return path;
+}
+
+DiskImage TwoRecordings()
+{
+    DiskImage image(SmallLayout());
+    image.Add(GeneratedRecording(0, 0, 0, 1700000000, 1700000600, 8, 1, 16));
+    image.Add(GeneratedRecording(1, 1, 1, 1700003600, 1700007200, 8, 1, 16));
+    return image;
+}
+
+class SummaryTest : public CatalogBuildTest, public ::testing::WithParamInterface<SummaryCase> {};
+
+// What the panel's status line says of a build, in plain words.
+TEST_P(SummaryTest, BuildIsDescribedInPlainWords)
+{
+    ::setenv("TZ", "UTC", 1);
+    ::tzset();
+    const std::string path = GetParam().makeDisk(dir_);
+    if (std::filesystem::is_regular_file(path))
+        Refingerprint(path);
+    const CatalogBuild result = Build(path);
+    EXPECT_EQ(DescribeBuild(result, catalog_, path), GetParam().summary);
+}
+
+INSTANTIATE_TEST_SUITE_P(
+    Builds, SummaryTest,
+    ::testing::Values(
+        SummaryCase{"BackupUsedAndEntrySkipped",
+                    [](const std::string& d) {
+                        DiskImage image = TwoRecordings();
+                        image.Add(GeneratedRecording(2, 2, 2, 1700010000, 1700010100, 8, 1, 16));
+                        return Written(image, d + "/a.img",
+                                       {{Target::PrimarySuperBlock, 0}, {Target::ListEntry, 1}, {Target::ListMirror, 1}});
+                    },
+                    "2 recordings, 2023-11-14 22:13 to 2023-11-15 01:01 (local time); 1 damaged entry skipped; "
+                    "primary superblock damaged, backup used"},
+        SummaryCase{"BothTablesDamaged",
+                    [](const std::string& d) {
+                        return Written(TwoRecordings(), d + "/b.img",
+                                       {{Target::PrimaryBlockTable, 0}, {Target::BackupBlockTable, 0}});
+                    },
+                    "not a recorder disk (both block tables damaged)"},
+        SummaryCase{"EveryEntryDamaged",
+                    [](const std::string& d) {
+                        return Written(TwoRecordings(), d + "/c.img",
+                                       {{Target::ListEntry, 0}, {Target::ListMirror, 0},
+                                        {Target::ListEntry, 1}, {Target::ListMirror, 1}});
+                    },
+                    "no recording entry can be read (2 entries damaged)"},
+        SummaryCase{"Truncated",
+                    [](const std::string& d) {
+                        const std::string path = Written(TwoRecordings(), d + "/t.img", {});
+                        std::filesystem::resize_file(path, 600000);
+                        return path;
+                    },
+                    "no recorder was ever configured on this disk; the image is 600 KB but the disk it holds is "
+                    "136 MB: truncated?"},
+        SummaryCase{"EmptyFile",
+                    [](const std::string& d) {
+                        std::ofstream(d + "/e.img").close();
+                        return d + "/e.img";
+                    },
+                    "not a recorder disk (the image is empty)"},
+        SummaryCase{"Directory", [](const std::string& d) { return d; }, "cannot read: Is a directory"}),
+    [](const ::testing::TestParamInfo<SummaryCase>& info) { return std::string(info.param.name); });
 
 }  // namespace

@@ -3,6 +3,8 @@
 #include <cstdlib>
 #include <ctime>
 
+#include <wx/uiaction.h>
+
 #include "tests/gui/panel_fixture.h"
 
 namespace {
@@ -65,20 +67,39 @@ TEST_F(PanelTest, RowsShowLocalTimesInTheWorkstationsZone)
     }
 }
 
-TEST_F(PanelTest, ADiskThatFailsLeavesThePreviousRowsAndAnEmptyCatalogueEmptiesThem)
+// A drive that cannot be read empties the list, so no row of the drive
+// chosen before can be played under this one's name, and the line under the
+// buttons says why; a good drive says what it holds.
+TEST_F(PanelTest, StatusLineSaysWhatTheDriveHoldsOrWhyItCannotBeRead)
 {
-    WriteDisk(0, {{100, 200}, {300, 400}});
+    TimeZone utc("UTC");
+    WriteDisk(0, {{1700000000, 1700000600}, {1700003600, 1700007200}});
     WriteNonDisk(1);
     WriteDisk(2, {});
+    const std::string d = dir_ + "/disk";
+    const struct {
+        int drive;
+        int rows;
+        std::string status;
+    } cases[] = {
+        {0, 2, "PHYSICALDRIVE0 (" + d + "0.img): 2 recordings, 2023-11-14 22:13 to 2023-11-15 00:13 (local time)"},
+        {1, 0, "PHYSICALDRIVE1 (" + d + "1.img): not a recorder disk (both superblocks damaged)"},
+        {0, 2, "PHYSICALDRIVE0 (" + d + "0.img): 2 recordings, 2023-11-14 22:13 to 2023-11-15 00:13 (local time)"},
+        {3, 0, "PHYSICALDRIVE3 (" + d + "3.img): cannot open: No such file or directory"},
+        {2, 0, "PHYSICALDRIVE2 (" + d + "2.img): no recordings"},
+    };
     MorvanePlugConfig* p = OpenPanel();
-    p->SendHddList(0);
-    ASSERT_EQ(p->m_recordList->GetItemCount(), 2);
+    for (const auto& c : cases) {
+        p->SendHddList(c.drive);
+        EXPECT_EQ(p->m_recordList->GetItemCount(), c.rows) << c.drive;
+        EXPECT_EQ(p->m_recordCount, c.rows);
+        EXPECT_EQ(p->m_statusLine->GetLabelText().utf8_string(), c.status);
+        EXPECT_TRUE(p->m_recordList->IsShown());
+    }
     p->SendHddList(1);
-    EXPECT_EQ(p->m_recordList->GetItemCount(), 2);
-    EXPECT_EQ(p->m_diskPath, wxString(dir_ + "/disk1.img"));
-    p->SendHddList(2);
-    EXPECT_EQ(p->m_recordList->GetItemCount(), 0);
-    EXPECT_TRUE(p->m_recordList->IsShown());
+    p->SendMorvaneCommand(0);  // the first row of drive 0 is gone with it
+    ASSERT_EQ(Events(iEVT_HDD_CONNECTED).size(), 1u);
+    EXPECT_EQ(Events(iEVT_HDD_CONNECTED)[0].record, 65535u);
 }
 
 TEST_F(PanelTest, ListEventsStopAtTheListControl)
@@ -126,6 +147,36 @@ TEST_F(PanelTest, ActivatingARowPlaysThatRowOnce)
     EXPECT_EQ(connects[0].panelId, p->m_panelId);
     EXPECT_EQ(p->m_currentRecord, 2);
     EXPECT_EQ(p->m_playState, 0);
+}
+
+// Real keys, through the X server: arrows, Home and End move in the list,
+// Enter plays the focused row.
+TEST_F(PanelTest, KeyboardMovesThroughTheRowsAndEnterPlays)
+{
+    WriteDisk(0, {{100, 200}, {300, 400}, {500, 600}, {700, 800}});
+    MorvanePlugConfig* p = OpenPanel();
+    p->SendHddList(0);
+    p->m_dialog->Raise();
+    p->m_recordList->SetFocus();
+    p->m_recordList->SetItemState(0, wxLIST_STATE_FOCUSED | wxLIST_STATE_SELECTED,
+                                  wxLIST_STATE_FOCUSED | wxLIST_STATE_SELECTED);
+    gui::Pump(100);
+    wxUIActionSimulator keys;
+    const struct {
+        int key;
+        long focused;
+    } steps[] = {{WXK_DOWN, 1}, {WXK_DOWN, 2}, {WXK_END, 3}, {WXK_HOME, 0}, {WXK_DOWN, 1}};
+    for (const auto& step : steps) {
+        keys.Char(step.key);
+        gui::Pump(60);
+        EXPECT_EQ(p->m_recordList->GetNextItem(-1, wxLIST_NEXT_ALL, wxLIST_STATE_FOCUSED), step.focused);
+    }
+    EXPECT_TRUE(Events(iEVT_HDD_CONNECTED).empty());
+    keys.Char(WXK_RETURN);
+    gui::Pump(100);
+    const std::vector<HostEventRecord> connects = Events(iEVT_HDD_CONNECTED);
+    ASSERT_EQ(connects.size(), 1u);
+    EXPECT_EQ(connects[0].record, 1u);
 }
 
 TEST_F(PanelTest, PlayingOutsideTheCatalogueDoesNothing)

@@ -114,7 +114,7 @@ int Info(const char* disk, bool dump)
     std::printf("offset_block_space=%llu\n", static_cast<unsigned long long>(super.OffsetBlockSpace));
     std::printf("super_offset=%llu\n", static_cast<unsigned long long>(super.SuperOffset));
     std::printf("super_offset_backup=%llu\n", static_cast<unsigned long long>(super.SuperOffsetBackup));
-    const bool onBackup = reader.m_errorCode == kErrBackupSuperBlock || reader.m_errorCode == kErrBackupBlockTable;
+    const bool onBackup = reader.m_volume->copyInUse != SuperBlockCopy::kPrimary;
     std::printf("superblock_copy=%s\n", onBackup ? "backup" : "primary");
 
     if (reader.Checkconfig() <= 0)

@@ -1,0 +1,18 @@
+// What a catalogue build found, in plain words for the person holding the
+// disk: how many recordings and when, what was passed over, or why the disk
+// could not be read.
+#ifndef CATALOG_BUILD_SUMMARY_H
+#define CATALOG_BUILD_SUMMARY_H
+
+#include <string>
+
+#include "catalog/catalog_reader.h"
+
+// For example "4 recordings, 2023-11-14 22:13 to 2023-11-15 02:13 (local
+// time); 1 damaged entry skipped", "cannot open: Permission denied — reading
+// a raw disk needs membership of the disk group", or "not a recorder disk
+// (both superblocks damaged)". `reader` is the one that ran the build on
+// `path`, as it was left.
+std::string DescribeBuild(CatalogBuild result, const CatalogReader& reader, const std::string& path);
+
+#endif
