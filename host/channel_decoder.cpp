@@ -8,9 +8,13 @@
 #include <memory>
 #include <vector>
 
+#include <cstdio>
+#include <string>
+
 #include "catalog/catalog_reader.h"
 #include "host/h264_decoder.h"
 #include "host/playback_control.h"
+#include "host/recording_timeline.h"
 #include "host/sdk_video.h"
 
 namespace {
@@ -24,6 +28,16 @@ int FrameInterval(int speed, int frames)
     const long long interval = static_cast<long long>(kFrameMilliseconds) * frames * PlaybackControl::kNormalSpeed /
                                std::max(1, std::abs(speed));
     return static_cast<int>(std::clamp<long long>(interval, 1, 10000));
+}
+
+std::string SpeedText(int speed)
+{
+    if (speed == 0)
+        return "paused";
+    char text[32];
+    std::snprintf(text, sizeof text, "%s%gx", speed < 0 ? "reverse " : "",
+                  std::abs(static_cast<double>(speed)) / PlaybackControl::kNormalSpeed);
+    return text;
 }
 
 }  // namespace
@@ -45,7 +59,17 @@ public:
             return false;
         m_oldest = adapter.FirstList;
         m_newest = adapter.LastList;
-        m_reader.m_streamBlock = recording.StartBlock;
+        m_newestFrames = adapter.CurBlockHeader.FrameCount;
+        // Block numbers as the forward walk counts them: once the data ring
+        // has wrapped, the newer recordings lie below the oldest one's start
+        // and are counted on from the end of the ring.
+        const bool wrapped = m_oldest.StartBlock > m_newest.EndBlock;
+        m_newestBlock = m_newest.EndBlock + (wrapped ? adapter.DataBlockMax : 0);
+        long long start = recording.StartBlock;
+        if (wrapped && start < m_oldest.StartBlock)
+            start += adapter.DataBlockMax;
+        m_timeline = std::make_unique<RecordingTimeline>(m_reader);
+        m_reader.m_streamBlock = start;
         m_reader.m_streamFrame = 0;
         m_payload.resize(static_cast<std::size_t>(kPayloadAreaSize));
         return m_decoder.Ok();
@@ -61,6 +85,7 @@ public:
                 wait = StepForward(lock, speed);
             else if (speed < 0)
                 wait = StepBackward(lock, speed);
+            ShowCaption(lock);
             if (!m_thread.Wait(lock, wait))
                 return;
         }
@@ -76,19 +101,76 @@ private:
             m_reader.m_streamFrame = m_lastEntry + 1;
         }
         m_lastDirection = 1;
+        if (PastTheNewestFrame())
+            return End(1);
+        const long long before = m_reader.m_streamBlock;
         _HisiHeader_t frame{};
         const int size = m_reader.get_stream(m_reader.m_diskFile, m_payload.data(), &frame, m_oldest, m_newest, 1);
         if (size < 0) {
             SkipDamaged(1);
             return 0;
         }
+        if (m_reader.m_streamBlock < before)
+            return End(1);  // the walk went round to the oldest recording
         m_damagedInARow = 0;
         m_lastBlock = m_reader.m_streamBlock;
         m_lastEntry = m_reader.m_streamFrame - 1;
-        for (Picture& picture : m_decoder.Decode(m_payload.data(), static_cast<std::size_t>(size), m_lastBlock,
-                                                 m_lastEntry, false))
-            m_thread.Publish(lock, std::move(picture));
+        Show(lock, size, PastTheNewestFrame());  // the newest frame must not stay in the parser
         return FrameInterval(speed, 1);
+    }
+
+    bool PastTheNewestFrame() const
+    {
+        const long long block = m_reader.m_streamBlock;
+        return block > m_newestBlock || (block == m_newestBlock && m_reader.m_streamFrame >= m_newestFrames);
+    }
+
+    bool BeforeTheOldestFrame() const
+    {
+        const long long block = m_reader.m_streamBlock;
+        return block < m_oldest.StartBlock || (block == m_oldest.StartBlock && m_reader.m_streamFrame < 0);
+    }
+
+    // Playback stops at either end of the disk's recordings, the last picture
+    // held, instead of going round the ring again.
+    int End(int end)
+    {
+        PlaybackControl::Get()->MarkEnd(m_dvrId, end);
+        return 0;
+    }
+
+    void Show(std::unique_lock<std::mutex>& lock, int size, bool flush)
+    {
+        m_shownTime = m_timeline->Locate(m_lastBlock, m_lastEntry);
+        m_shownAny = true;
+        for (Picture& picture : m_decoder.Decode(m_payload.data(), static_cast<std::size_t>(size), m_lastBlock,
+                                                 m_lastEntry, flush))
+            m_thread.Publish(lock, std::move(picture));
+    }
+
+    // The line over the picture: which recording, the time of the frame
+    // shown, and the speed or why playback stopped.
+    void ShowCaption(std::unique_lock<std::mutex>& lock)
+    {
+        if (!m_shownAny)
+            return;
+        PlaybackControl::Session session;
+        if (!PlaybackControl::Get()->Find(m_dvrId, &session))
+            return;
+        std::string caption = m_shownTime.row >= 0
+                                  ? "row " + std::to_string(m_shownTime.row) + " \u00B7 " +
+                                        RecordingTimeline::LocalText(m_shownTime.seconds)
+                                  : std::string("a block outside the listed recordings");
+        if (session.end > 0)
+            caption += " \u00B7 end of the newest recording";
+        else if (session.end < 0)
+            caption += " \u00B7 start of the oldest recording";
+        else
+            caption += " \u00B7 " + SpeedText(session.speed);
+        if (caption != m_caption) {
+            m_caption = caption;
+            m_thread.PublishCaption(lock, caption);
+        }
     }
 
     // Backwards the key frames are shown in reverse order, each after the
@@ -101,6 +183,9 @@ private:
         }
         m_lastDirection = -1;
         for (int passed = 1; passed <= kMaxFramesToAKeyFrame; ++passed) {
+            if (BeforeTheOldestFrame())
+                return End(-1);
+            const long long before = m_reader.m_streamBlock;
             _HisiHeader_t frame{};
             const int size =
                 m_reader.get_stream(m_reader.m_diskFile, m_payload.data(), &frame, m_oldest, m_newest, 0);
@@ -108,15 +193,15 @@ private:
                 SkipDamaged(-1);
                 return 0;
             }
+            if (m_reader.m_streamBlock > before || m_reader.m_streamBlock < m_oldest.StartBlock)
+                return End(-1);  // the walk went round to the newest recording
             m_damagedInARow = 0;
             m_lastBlock = m_reader.m_streamBlock;
             m_lastEntry = m_reader.m_streamFrame + 1;
             if (!H264Decoder::IsKeyFrame(m_payload.data(), static_cast<std::size_t>(size)))
                 continue;
             m_decoder.Reset();
-            for (Picture& picture : m_decoder.Decode(m_payload.data(), static_cast<std::size_t>(size), m_lastBlock,
-                                                     m_lastEntry, true))
-                m_thread.Publish(lock, std::move(picture));
+            Show(lock, size, true);
             return FrameInterval(speed, passed);
         }
         return FrameInterval(speed, kMaxFramesToAKeyFrame);
@@ -136,8 +221,6 @@ private:
         } else {
             --m_reader.m_streamBlock;
             m_reader.m_streamFrame = -1;
-            if (m_reader.m_streamBlock < 0)
-                m_reader.m_streamBlock = m_newest.EndBlock;
         }
         m_decoder.Reset();
     }
@@ -151,6 +234,12 @@ private:
     std::vector<unsigned char> m_payload;
     _HisiList_t m_oldest{};
     _HisiList_t m_newest{};
+    long long m_newestBlock = 0;  // the newest recording's last block, as the forward walk counts it
+    int m_newestFrames = 0;       // the frames of that block
+    std::unique_ptr<RecordingTimeline> m_timeline;
+    FrameTime m_shownTime;
+    bool m_shownAny = false;
+    std::string m_caption;
     long long m_lastBlock = 0;
     int m_lastEntry = 0;
     int m_lastDirection = 0;
@@ -212,6 +301,12 @@ void ChannelDecoder::Publish(std::unique_lock<std::mutex>&, Picture picture)
 {
     if (m_canvas)
         m_canvas->ShowPicture(0, std::move(picture));
+}
+
+void ChannelDecoder::PublishCaption(std::unique_lock<std::mutex>&, const std::string& caption)
+{
+    if (m_canvas)
+        m_canvas->ShowCaption(caption);
 }
 
 // The thread ends only when it is deleted; until then it touches nothing.

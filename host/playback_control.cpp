@@ -15,14 +15,27 @@ void PlaybackControl::Start(long long dvrId, const wxString& path, int record)
     session.path = path.Clone();  // the decoder thread reads it: no shared buffer
     session.record = record;
     session.speed = kNormalSpeed;
+    session.end = 0;
 }
 
 void PlaybackControl::SetSpeed(long long dvrId, int speed)
 {
     std::lock_guard<std::mutex> lock(m_mutex);
     auto it = m_sessions.find(dvrId);
-    if (it != m_sessions.end())
+    if (it != m_sessions.end()) {
         it->second.speed = speed;
+        it->second.end = 0;
+    }
+}
+
+void PlaybackControl::MarkEnd(long long dvrId, int end)
+{
+    std::lock_guard<std::mutex> lock(m_mutex);
+    auto it = m_sessions.find(dvrId);
+    if (it != m_sessions.end()) {
+        it->second.speed = 0;
+        it->second.end = end;
+    }
 }
 
 bool PlaybackControl::Find(long long dvrId, Session* session) const

@@ -19,12 +19,18 @@ public:
         wxString path;   // the disk
         int record = 0;  // list index of the recording (its low 16 bits)
         int speed = kNormalSpeed;
+        // Where playback stopped by itself: 1 after the newest frame of the
+        // disk, -1 before its oldest, 0 while it can go on.
+        int end = 0;
     };
 
     static PlaybackControl* Get();
 
     void Start(long long dvrId, const wxString& path, int record);
+    // The speed of a transport command; playback goes on from where it is.
     void SetSpeed(long long dvrId, int speed);
+    // Playback reached an end of the disk's recordings: the picture holds.
+    void MarkEnd(long long dvrId, int end);
     // A copy of the session of a DVR; false when the host never answered it.
     bool Find(long long dvrId, Session* session) const;
     int Speed(long long dvrId) const;

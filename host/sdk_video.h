@@ -6,6 +6,7 @@
 #include <atomic>
 #include <mutex>
 #include <condition_variable>
+#include <string>
 #include <vector>
 
 #include <wx/glcanvas.h>
@@ -40,6 +41,9 @@ public:
     void ShowPicture(int channel, Picture picture);
     int PicturesReceived() const;
     Picture LastPicture() const;
+    // The line shown over the picture (UTF-8), from any thread.
+    void ShowCaption(const std::string& caption);
+    std::string Caption() const;
     // What the canvas shows now: its scene drawn once more and read back
     // from OpenGL (empty when it cannot draw).
     wxImage Snapshot();
@@ -59,8 +63,10 @@ public:
 private:
     static constexpr int kMaxChannels = 32;
     void UploadNewestPictures();
+    void UploadCaption();
     void DrawScene();
     void DrawCell(int channel, int columns);
+    void DrawCaption();
 
     wxGLContext* m_context;
     mutable std::mutex m_pictureMutex;
@@ -70,6 +76,11 @@ private:
     Picture m_last;
     unsigned int m_textures[kMaxChannels] = {};
     bool m_hasTexture[kMaxChannels] = {};
+    wxSize m_pictureSize[kMaxChannels];
+    std::string m_caption;
+    bool m_captionFresh = false;
+    unsigned int m_captionTexture = 0;
+    wxSize m_captionSize;
     std::vector<Call> m_calls;
     int m_textureUpdates = 0;
     int m_renders = 0;
@@ -102,6 +113,7 @@ private:
     bool Wait(std::unique_lock<std::mutex>& lock, int milliseconds);
     bool Stopping();
     void Publish(std::unique_lock<std::mutex>& lock, Picture picture);
+    void PublishCaption(std::unique_lock<std::mutex>& lock, const std::string& caption);
     void IdleUntilDeleted(std::unique_lock<std::mutex>& lock);
 
     std::mutex m_mutex;

@@ -53,9 +53,14 @@ SYMBOLS = {
     "forward": union(triangle(3, 8, 15, 22), triangle(15, 8, 27, 22)),
     # Hand over to the file player: a sheet with a play mark on it.
     "sw": union(frame(6, 3, 24, 27, 2), triangle(11, 10, 20, 20)),
-    # The toolbar's disk playback: a disk drive with a play mark.
-    "remoteplay": union(frame(2, 5, 28, 25, 2), triangle(11, 9, 20, 21)),
 }
+
+# The toolbar's disk playback: a disk drive with a play mark, in colours that
+# stand out on a light toolbar (a light symbol there looks disabled).
+TOOLBAR = [
+    (box(2, 5, 28, 25), (28, 72, 150)),
+    (triangle(10, 8.5, 21, 21.5), (255, 170, 40)),
+]
 
 
 def render(shape, size, colour):
@@ -71,6 +76,27 @@ def render(shape, size, colour):
                     y = (py + (sy + 0.5) / SAMPLES) * scale
                     hits += shape(x, y)
             alpha = round(255 * hits / (SAMPLES * SAMPLES))
+            row += bytes(colour) + bytes([alpha])
+        rows.append(bytes(row))
+    return b"".join(rows)
+
+
+def render_layers(layers, size):
+    """Shapes painted one over the other, each in its own colour."""
+    scale = 30.0 / size
+    rows = []
+    for py in range(size):
+        row = bytearray([0])
+        for px in range(size):
+            colour, alpha = (0, 0, 0), 0
+            for shape, layer_colour in layers:
+                hits = sum(shape((px + (sx + 0.5) / SAMPLES) * scale, (py + (sy + 0.5) / SAMPLES) * scale)
+                           for sy in range(SAMPLES) for sx in range(SAMPLES))
+                if hits:
+                    cover = hits / (SAMPLES * SAMPLES)
+                    colour = tuple(round(c * (1 - cover) + l * cover) if alpha else l
+                                   for c, l in zip(colour, layer_colour))
+                    alpha = max(alpha, round(255 * cover))
             row += bytes(colour) + bytes([alpha])
         rows.append(bytes(row))
     return b"".join(rows)
@@ -93,7 +119,7 @@ def main():
     for name in ("play", "pause", "stop", "reverse", "forward", "sw"):
         png(os.path.join(HERE, name + "_up.png"), 30, render(SYMBOLS[name], 30, UP))
         png(os.path.join(HERE, name + "_dn.png"), 30, render(SYMBOLS[name], 30, DOWN))
-    png(os.path.join(HERE, "remoteplay.png"), 32, render(SYMBOLS["remoteplay"], 32, UP))
+    png(os.path.join(HERE, "remoteplay.png"), 32, render_layers(TOOLBAR, 32))
 
 
 if __name__ == "__main__":

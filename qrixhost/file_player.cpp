@@ -2,13 +2,13 @@
 
 #include "host/playback_control.h"
 
+#include <wx/sizer.h>
+
 #include <set>
 
 namespace {
 
 std::set<FilePlayer*> g_players;
-
-
 }  // namespace
 
 FilePlayer::FilePlayer(const wxString& disk, int record)
@@ -17,9 +17,15 @@ FilePlayer::FilePlayer(const wxString& disk, int record)
       m_id(getCPUTickCount()),
       m_tick(this)
 {
-    m_canvas = new BasicGLPane(this, BasicGLPane::HostAttributes(), FrameManager::Get()->GLRCProcess(1, nullptr), wxDefaultPosition,
-                               wxDefaultSize);
+    m_canvas = new BasicGLPane(this, BasicGLPane::HostAttributes(), FrameManager::Get()->GLRCProcess(1, nullptr),
+                               wxDefaultPosition, wxDefaultSize);
     m_canvas->Init();
+    m_playPause = new wxButton(this, wxID_ANY, "Pause");
+    auto* layout = new wxBoxSizer(wxVERTICAL);
+    layout->Add(m_canvas, 1, wxEXPAND);
+    layout->Add(m_playPause, 0, wxALL, 4);
+    SetSizer(layout);
+    m_playPause->Bind(wxEVT_BUTTON, &FilePlayer::OnPlayPause, this);
     m_canvas->SetOnAllChannels(0, 1, 3);
     PlaybackControl::Get()->Start(m_id, disk, record);
     m_decoder = new ChannelDecoder(nullptr);
@@ -66,6 +72,14 @@ void FilePlayer::StopDecoder()
 void FilePlayer::OnTick(wxTimerEvent&)
 {
     m_canvas->ProcessTexture(2, nullptr);
+}
+
+// Pause holds the picture; Play goes on at normal speed from it.
+void FilePlayer::OnPlayPause(wxCommandEvent&)
+{
+    const bool playing = PlaybackControl::Get()->Speed(m_id) != 0;
+    PlaybackControl::Get()->SetSpeed(m_id, playing ? 0 : PlaybackControl::kNormalSpeed);
+    m_playPause->SetLabel(playing ? "Play" : "Pause");
 }
 
 void FilePlayer::OnClose(wxCloseEvent& event)

@@ -3,6 +3,7 @@
 #ifndef QRIXHOST_FILE_PLAYER_H
 #define QRIXHOST_FILE_PLAYER_H
 
+#include <wx/button.h>
 #include <wx/frame.h>
 #include <wx/timer.h>
 
@@ -14,6 +15,7 @@ public:
     ~FilePlayer() override;
 
     BasicGLPane* canvas() const { return m_canvas; }
+    wxButton* playPause() const { return m_playPause; }
     // Closes every file player now (the host is ending: the shared OpenGL
     // context goes next).
     static void CloseAll();
@@ -21,10 +23,12 @@ public:
 private:
     void OnTick(wxTimerEvent& event);
     void OnClose(wxCloseEvent& event);
+    void OnPlayPause(wxCommandEvent& event);
     void StopDecoder();
 
     long long m_id;
     BasicGLPane* m_canvas;
+    wxButton* m_playPause;
     ChannelDecoder* m_decoder = nullptr;
     wxTimer m_tick;
 };

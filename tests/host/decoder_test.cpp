@@ -138,6 +138,43 @@ TEST_F(DecoderTest, BackwardShowsTheKeyFramesInReverseOrder)
     EXPECT_TRUE(canvas_->LastPicture().key);
 }
 
+// Playback stops at either end of the disk's recordings with the picture
+// held, and the line over the picture says where playback stands: the row,
+// the frame's time (spread over the recording's start and end) and the
+// speed or the end reached.
+TEST_F(DecoderTest, PlaybackStopsAtTheEndsOfTheDiskAndTheCaptionSaysWhere)
+{
+    ::setenv("TZ", "UTC", 1);
+    ::tzset();
+    WriteClipDisk(disk_, {{0, 0, 1, 100}, {1, 2, 3, 200}});  // each recording an hour long
+    Start(1, 1024);
+    ASSERT_FALSE(Watch(150).empty());
+    EXPECT_EQ(canvas_->Caption().rfind("row 1 \u00B7 1970-01-01 00:0", 0), 0u) << canvas_->Caption();
+    EXPECT_EQ(canvas_->Caption().substr(canvas_->Caption().size() - 6), " \u00B7 1x");
+    PlaybackControl::Get()->SetSpeed(kDvr, 0);
+    Watch(100);
+    EXPECT_EQ(canvas_->Caption().substr(canvas_->Caption().size() - 6), "paused");
+
+    PlaybackControl::Get()->SetSpeed(kDvr, 16384);
+    Watch(1500);
+    EXPECT_TRUE(Watch(300).empty());
+    EXPECT_EQ(canvas_->LastPicture().block * 100 + canvas_->LastPicture().entry, 324);
+    PlaybackControl::Session session;
+    ASSERT_TRUE(PlaybackControl::Get()->Find(kDvr, &session));
+    EXPECT_EQ(session.end, 1);
+    EXPECT_EQ(canvas_->Caption(), "row 1 \u00B7 1970-01-01 01:03:20 (local time) \u00B7 end of the newest recording");
+
+    PlaybackControl::Get()->SetSpeed(kDvr, -16384);  // back over the key frames to the oldest one
+    Watch(1500);
+    EXPECT_TRUE(Watch(300).empty());
+    EXPECT_EQ(canvas_->LastPicture().block * 100 + canvas_->LastPicture().entry, 0);
+    ASSERT_TRUE(PlaybackControl::Get()->Find(kDvr, &session));
+    EXPECT_EQ(session.end, -1);
+    EXPECT_EQ(canvas_->Caption(), "row 0 \u00B7 1970-01-01 00:01:40 (local time) \u00B7 start of the oldest recording");
+    ::unsetenv("TZ");
+    ::tzset();
+}
+
 TEST_F(DecoderTest, StopEndsTheDeliveries)
 {
     WriteClipDisk(disk_, {{0, 0, 3, 100}});

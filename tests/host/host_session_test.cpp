@@ -199,6 +199,15 @@ TEST_F(HostSessionTest, ActivatedRowPlaysInTheCanvasAndTheTransportCommandsReach
     EXPECT_TRUE(player->GetTitle().Contains("recording 1"));
     gui::Pump(600);
     EXPECT_GT(player->canvas()->PicturesReceived(), 3);
+    EXPECT_TRUE(player->canvas()->Caption().rfind("row 1 \u00B7 ", 0) == 0) << player->canvas()->Caption();
+    ClickAt(player->playPause(), wxPoint(10, 10));  // pause: the picture holds
+    const int held = player->canvas()->PicturesReceived();
+    gui::Pump(400);
+    EXPECT_EQ(player->canvas()->PicturesReceived(), held);
+    EXPECT_EQ(player->playPause()->GetLabel(), "Play");
+    ClickAt(player->playPause(), wxPoint(10, 10));
+    gui::Pump(400);
+    EXPECT_GT(player->canvas()->PicturesReceived(), held);
 }
 
 TEST_F(HostSessionTest, PluginsStaticTableTookTheHostsToolbarIdentifierWhenLoaded)
