@@ -32,8 +32,12 @@ void MorvanePlugConfig::SendHddList(int drive)
 void MorvanePlugConfig::ShowBuildSummary(int drive, CatalogBuild result)
 {
     const std::string summary = DescribeBuild(result, *this, m_diskPath.utf8_string());
-    m_statusLine->SetLabelText(wxString::Format("PHYSICALDRIVE%d (%s): %s", drive, m_diskPath,
-                                            wxString::FromUTF8(summary.c_str())));
+    const wxString text =
+        wxString::Format("PHYSICALDRIVE%d (%s): %s", drive, m_diskPath, wxString::FromUTF8(summary.c_str()));
+    // Two lines under the list and the buttons hold even a long image path.
+    m_statusLine->SetLabelText(text);
+    m_statusLine->Wrap(m_statusLine->GetSize().x);
+    m_statusLine->SetToolTip(text);
 }
 
 void MorvanePlugConfig::Setwxlist()

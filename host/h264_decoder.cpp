@@ -8,14 +8,17 @@ extern "C" {
 #include <libswscale/swscale.h>
 }
 
-H264Decoder::H264Decoder()
+H264Decoder::H264Decoder(int threads)
 {
     const AVCodec* codec = avcodec_find_decoder(AV_CODEC_ID_H264);
     if (!codec)
         return;
     m_context = avcodec_alloc_context3(codec);
-    m_context->flags |= AV_CODEC_FLAG_LOW_DELAY;  // a picture as soon as its frame is in
-    m_context->thread_count = 1;
+    m_context->thread_count = threads;
+    if (threads == 1)
+        m_context->flags |= AV_CODEC_FLAG_LOW_DELAY;  // a picture as soon as its frame is in
+    else
+        m_context->thread_type = FF_THREAD_FRAME | FF_THREAD_SLICE;
     if (avcodec_open2(m_context, codec, nullptr) < 0) {
         avcodec_free_context(&m_context);
         return;

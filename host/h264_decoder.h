@@ -17,7 +17,11 @@ struct SwsContext;
 
 class H264Decoder {
 public:
-    H264Decoder();
+    // `threads` 1 decodes on the calling thread alone, with a picture out as
+    // soon as its frame is in (what a playing channel wants); more, or 0 for
+    // as many as there are cores, lets libavcodec decode several frames at
+    // once, each picture then coming out some frames later.
+    explicit H264Decoder(int threads = 1);
     ~H264Decoder();
     H264Decoder(const H264Decoder&) = delete;
     H264Decoder& operator=(const H264Decoder&) = delete;

@@ -95,8 +95,8 @@ MorvanePlugConfig::MorvanePlugConfig(wxWindow* parent, MorvanePlugin* plugin, wx
     m_btnReverse = MakeButton(1031, "reverse", wxPoint(515, 530));
     m_btnForward = MakeButton(1032, "forward", wxPoint(555, 530));
     m_btnSwitch = MakeButton(1033, "sw", wxPoint(750, 530));
-    m_statusLine = new wxStaticText(m_dialog, wxID_ANY, wxString(), wxPoint(200, 566), wxSize(585, 20),
-                                    wxST_NO_AUTORESIZE | wxST_ELLIPSIZE_END);
+    m_statusLine = new wxStaticText(m_dialog, wxID_ANY, wxString(), wxPoint(10, 564), wxSize(775, 34),
+                                    wxST_NO_AUTORESIZE);
     m_statusLine->SetForegroundColour(wxColour(240, 240, 240, 255));
 
     SetDriverTrees();
@@ -165,14 +165,14 @@ void MorvanePlugConfig::OnSize(wxSizeEvent& event)
             button->SetSize(x, 530, m_buttonSize.x, m_buttonSize.y, wxSIZE_AUTO);
             x += 40;
         }
-        m_statusLine->SetSize(200, 566, 585, 20, wxSIZE_AUTO);
+        m_statusLine->SetSize(10, 564, 775, 34, wxSIZE_AUTO);
         return;
     }
     m_recordList->SetSize(10, 70, 180, std::max(height - 110, 1), wxSIZE_AUTO);
     if (m_glPane)
         m_glPane->SetSize(200, 10, std::max(width - 215, 1), std::max(height - 100, 1), wxSIZE_AUTO);
     PlaceButtonRow(height - 70, (6 * width) / 16);
-    m_statusLine->SetSize(200, height - 34, std::max(width - 215, 1), 20, wxSIZE_AUTO);
+    m_statusLine->SetSize(10, height - 36, std::max(width - 25, 1), 34, wxSIZE_AUTO);
 }
 
 void MorvanePlugConfig::PlaceButtonRow(int y, int base)

@@ -93,7 +93,7 @@ TEST_F(PanelTest, StatusLineSaysWhatTheDriveHoldsOrWhyItCannotBeRead)
         p->SendHddList(c.drive);
         EXPECT_EQ(p->m_recordList->GetItemCount(), c.rows) << c.drive;
         EXPECT_EQ(p->m_recordCount, c.rows);
-        EXPECT_EQ(p->m_statusLine->GetLabelText().utf8_string(), c.status);
+        EXPECT_EQ(p->m_statusLine->GetToolTipText().utf8_string(), c.status);
         EXPECT_TRUE(p->m_recordList->IsShown());
     }
     p->SendHddList(1);

@@ -16,7 +16,7 @@ dvrimage::DiskImage WriteClipDisk(const std::string& path, const std::vector<Cli
         r.startBlock = c.startBlock;
         r.endBlock = c.endBlock;
         r.startTime = c.startTime;
-        r.endTime = c.startTime + 3600;
+        r.endTime = c.startTime + c.duration;
         const int blocks = c.endBlock >= c.startBlock ? c.endBlock - c.startBlock + 1
                                                       : c.endBlock + dataBlocks - c.startBlock + 1;
         for (int b = 0; b < blocks; ++b) {

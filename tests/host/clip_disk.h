@@ -13,6 +13,7 @@ struct ClipRecording {
     int startBlock;
     int endBlock;
     unsigned startTime;
+    unsigned duration = 3600;  // seconds from start to end
 };
 
 // Writes the image and returns the writer, for damage after writing.

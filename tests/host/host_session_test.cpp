@@ -15,6 +15,7 @@
 #include <wx/dcmemory.h>
 #include <wx/dcscreen.h>
 #include <wx/listctrl.h>
+#include <wx/stattext.h>
 #include <wx/treectrl.h>
 #include <wx/uiaction.h>
 
@@ -48,9 +49,35 @@ protected:
         std::filesystem::remove_all(dir_);
     }
 
+    // The sample disk of scripts/sample: four recordings, the newest across
+    // the end of the data ring, the first one's list entry repaired from
+    // the mirror.
     static void WriteSampleDisk(const std::string& path)
     {
-        WriteClipDisk(path, {{0, 2, 4, 1700000000}, {1, 5, 9, 1700007200}, {2, 12, 1, 1700014400}});
+        dvrimage::DiskImage image = WriteClipDisk(
+            path, {{0, 2, 4, 1700000000, 3}, {1, 5, 9, 1700007200, 5}, {2, 10, 11, 1700010800, 2},
+                   {3, 13, 1, 1700014400, 5}});
+        image.Damage(dvrimage::Target::ListEntry, 0);
+    }
+
+    // Opens the drive selector and clicks drive `n`'s label, for real.
+    static void ChooseDrive(int n)
+    {
+        auto* combo = dynamic_cast<wxComboCtrl*>(wxWindow::FindWindowById(1011));
+        ASSERT_NE(combo, nullptr);
+        combo->Popup();
+        gui::Pump(200);
+        auto* tree = dynamic_cast<wxTreeCtrl*>(combo->GetPopupControl()->GetControl());
+        ASSERT_NE(tree, nullptr);
+        wxTreeItemIdValue cookie;
+        wxTreeItemId drive = tree->GetFirstChild(tree->GetRootItem(), cookie);
+        for (int i = 0; i < n && drive.IsOk(); ++i)
+            drive = tree->GetNextChild(tree->GetRootItem(), cookie);
+        ASSERT_TRUE(drive.IsOk());
+        EXPECT_EQ(tree->GetItemText(drive), wxString::Format("PHYSICALDRIVE%d", n));
+        wxRect label;
+        ASSERT_TRUE(tree->GetBoundingRect(drive, label, true));
+        ClickAt(tree, label.GetPosition() + label.GetSize() / 2);
     }
 
     // A real click (through the X server) at a point of a window.
@@ -95,23 +122,35 @@ TEST_F(HostSessionTest, ToolbarOpensThePanelAndAChosenDriveListsItsRecordings)
     ASSERT_NE(combo, nullptr);
     EXPECT_EQ(list->GetItemCount(), 0);
 
-    combo->Popup();
-    gui::Pump(200);
-    auto* tree = dynamic_cast<wxTreeCtrl*>(combo->GetPopupControl()->GetControl());
-    ASSERT_NE(tree, nullptr);
-    wxTreeItemIdValue cookie;
-    const wxTreeItemId drive = tree->GetFirstChild(tree->GetRootItem(), cookie);
-    ASSERT_TRUE(drive.IsOk());
-    EXPECT_EQ(tree->GetItemText(drive), "PHYSICALDRIVE0");
-    wxRect label;
-    ASSERT_TRUE(tree->GetBoundingRect(drive, label, true));
-    ClickAt(tree, label.GetPosition() + label.GetSize() / 2);
-
-    ASSERT_EQ(list->GetItemCount(), 3);
+    ChooseDrive(0);
+    ASSERT_EQ(list->GetItemCount(), 4);
     EXPECT_EQ(list->GetItemText(0, 0), "0.");
-    EXPECT_EQ(list->GetItemText(2, 0), "2.");
+    EXPECT_EQ(list->GetItemText(3, 0), "3.");
     EXPECT_EQ(combo->GetValue(), "PHYSICALDRIVE0");
     if (const char* shot = std::getenv("MORVANE_SCREENSHOT"))
+        SaveScreenshot(list->GetParent(), shot);
+}
+
+// A drive that is no recorder disk, chosen after a good one: the list is
+// emptied and the line under the buttons says why.
+TEST_F(HostSessionTest, ChoosingAnUnreadableDriveEmptiesTheListAndSaysWhy)
+{
+    std::ofstream(dir_ / "disk1.img") << std::string(4096, 'x');
+    ASSERT_TRUE(session_->PluginLoaded()) << session_->Error();
+    session_->plugins().plugin()->Configure();
+    gui::Pump(200);
+    auto* list = dynamic_cast<wxListCtrl*>(wxWindow::FindWindowById(1012));
+    ASSERT_NE(list, nullptr);
+    ChooseDrive(0);
+    ASSERT_EQ(list->GetItemCount(), 4);
+    ChooseDrive(1);
+    EXPECT_EQ(list->GetItemCount(), 0);
+    bool said = false;
+    for (wxWindow* child : list->GetParent()->GetChildren())
+        if (auto* text = dynamic_cast<wxStaticText*>(child))
+            said = said || text->GetToolTipText().EndsWith("disk1.img): not a recorder disk (both superblocks damaged)");
+    EXPECT_TRUE(said);
+    if (const char* shot = std::getenv("MORVANE_FAILED_SCREENSHOT"))
         SaveScreenshot(list->GetParent(), shot);
 }
 
@@ -140,15 +179,8 @@ TEST_F(HostSessionTest, ActivatedRowPlaysInTheCanvasAndTheTransportCommandsReach
     ASSERT_NE(canvas, nullptr);
 
     // Choose the drive through the selector, then double-click row 1.
-    auto* combo = dynamic_cast<wxComboCtrl*>(wxWindow::FindWindowById(1011));
-    combo->Popup();
-    gui::Pump(200);
-    auto* tree = dynamic_cast<wxTreeCtrl*>(combo->GetPopupControl()->GetControl());
-    wxTreeItemIdValue cookie;
-    wxRect label;
-    ASSERT_TRUE(tree->GetBoundingRect(tree->GetFirstChild(tree->GetRootItem(), cookie), label, true));
-    ClickAt(tree, label.GetPosition() + label.GetSize() / 2);
-    ASSERT_EQ(list->GetItemCount(), 3);
+    ChooseDrive(0);
+    ASSERT_EQ(list->GetItemCount(), 4);
     wxRect row;
     ASSERT_TRUE(list->GetItemRect(1, row));
     wxUIActionSimulator mouse;

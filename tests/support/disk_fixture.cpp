@@ -3,6 +3,7 @@
 #include <fcntl.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cstdlib>
 #include <cstring>
 #include <filesystem>
@@ -63,9 +64,12 @@ dvrimage::Layout SmallLayout()
 void DiskTest::SetUp()
 {
     const auto* info = ::testing::UnitTest::GetInstance()->current_test_info();
-    std::filesystem::path dir = std::filesystem::temp_directory_path() /
-                                (std::string("dvrfs-test-") + std::to_string(::getpid()) + "-" +
-                                 info->test_suite_name() + "-" + info->name());
+    // One folder per test, removed whole afterwards: parameterised names hold
+    // slashes, which must not make nested folders.
+    std::string name = std::string("dvrfs-test-") + std::to_string(::getpid()) + "-" + info->test_suite_name() +
+                       "-" + info->name();
+    std::replace(name.begin(), name.end(), '/', '_');
+    const std::filesystem::path dir = std::filesystem::temp_directory_path() / name;
     std::filesystem::remove_all(dir);
     std::filesystem::create_directories(dir);
     dir_ = dir.string();
