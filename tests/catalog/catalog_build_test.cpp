@@ -130,8 +130,8 @@ TEST_P(DamagedListTest, DamagedEntryCostsOnlyItsOwnRow)
         ASSERT_TRUE(dvrfstool::RecordingOfRow(catalog_, row, &recording));
         EXPECT_EQ(recording.Idx, idx);
         std::vector<unsigned char> stream;
-        dvrfstool::ExtractRecording(catalog_, recording, [&stream](const unsigned char* data, std::size_t size) {
-            stream.insert(stream.end(), data, data + size);
+        dvrfstool::ExtractRecording(catalog_, recording, [&stream](const dvrfstool::ExtractedFrame& f) {
+            stream.insert(stream.end(), f.data, f.data + f.size);
             return true;
         });
         std::vector<std::uint8_t> expected = dvrimage::PatternPayload(idx, 0, 64);

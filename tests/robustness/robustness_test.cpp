@@ -46,7 +46,7 @@ TEST_F(RobustnessTest, ReadOnlyImageIsOnlyEverOpenedForReadingAndKeepsItsBytes)
     _HisiList_t recording{};
     ASSERT_TRUE(dvrfstool::RecordingOfRow(catalog_, 1, &recording));
     const dvrfstool::ExtractResult extracted =
-        dvrfstool::ExtractRecording(catalog_, recording, [](const unsigned char*, std::size_t) { return true; });
+        dvrfstool::ExtractRecording(catalog_, recording, [](const dvrfstool::ExtractedFrame&) { return true; });
     EXPECT_EQ(extracted.frames, 9);
 
     EXPECT_EQ(FileFingerprint(path), before);
@@ -126,6 +126,38 @@ TEST_F(RobustnessTest, NewestRecordingWithoutAnyHeaderIsSearchedOnceRoundTheRing
     EXPECT_LE(reads, (1u << 20) + 400);
     std::printf("[ figures  ] data ring of %d blocks without headers: build gave up after %zu reads\n", 1 << 20,
                 reads);
+}
+
+// 2^17 recordings, each claiming the whole data ring of 2^16 blocks (none of
+// them written): verify checks each block once, and walks no recording's
+// blocks again, so it costs the list span plus the ring, not their product.
+TEST_F(RobustnessTest, ManyRecordingsClaimingTheWholeRingAreVerifiedBlockByBlockOnce)
+{
+    constexpr int kEntries = 1 << 17;
+    constexpr int kRing = 1 << 16;
+    Layout layout = SmallLayout();
+    layout.listMax = kEntries;
+    layout.dataBlockMax = kRing;
+    DiskImage image(layout);
+    for (int i = 0; i < kEntries; ++i) {
+        dvrimage::Recording r;  // the list entry alone
+        r.listIdx = i;
+        r.endBlock = kRing - 1;
+        image.Add(std::move(r));
+    }
+    const std::string path = WriteImage(image);
+
+    iotrace::KeepReads(false);
+    long long headers = 0;
+    const dvrfstool::VerifyResult verified =
+        dvrfstool::VerifyDisk(catalog_, wxString::FromUTF8(path.c_str()), [&headers](const std::string& line) {
+            headers += line.find(" header") != std::string::npos;
+        });
+    EXPECT_EQ(verified.stage, dvrfstool::VerifyStage::kComplete);
+    EXPECT_EQ(headers, kRing);  // every block reported once: none of them was written
+    // The refresh and the verification each read both copies of the span's
+    // entries; the refresh's search and the verification each read the ring's headers.
+    EXPECT_LE(iotrace::ReadCount(path), 4u * kEntries + 2u * kRing + 600);
 }
 
 TEST_F(RobustnessTest, ImageEndingInTheMiddleOfTheListStopsTheCatalogueThere)

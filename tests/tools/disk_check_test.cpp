@@ -5,6 +5,7 @@
 #include <vector>
 
 #include "tests/support/disk_fixture.h"
+#include "tests/support/io_trace.h"
 #include "tools/dvrfs/disk_check.h"
 
 namespace {
@@ -42,8 +43,8 @@ TEST_F(DiskCheckTest, ExtractionPassesOverFramesABlockOnlyClaims)
 
     std::vector<unsigned char> stream;
     const dvrfstool::ExtractResult result =
-        dvrfstool::ExtractRecording(catalog_, recording, [&stream](const unsigned char* data, std::size_t size) {
-            stream.insert(stream.end(), data, data + size);
+        dvrfstool::ExtractRecording(catalog_, recording, [&stream](const dvrfstool::ExtractedFrame& f) {
+            stream.insert(stream.end(), f.data, f.data + f.size);
             return true;
         });
     EXPECT_EQ(result.frames, 6);
@@ -59,10 +60,80 @@ TEST_F(DiskCheckTest, ExtractionPassesOverFramesABlockOnlyClaims)
     // A recording claiming 2^31 blocks is walked once round the ring of 8.
     recording.EndBlock = INT_MAX;
     const dvrfstool::ExtractResult longest =
-        dvrfstool::ExtractRecording(catalog_, recording, [](const unsigned char*, std::size_t) { return true; });
+        dvrfstool::ExtractRecording(catalog_, recording, [](const dvrfstool::ExtractedFrame&) { return true; });
     EXPECT_EQ(longest.frames, 6);
     EXPECT_EQ(longest.skippedBlocks, 6);
 }
+
+struct FramesCase {
+    const char* name;
+    std::uint8_t recordSum;
+    std::vector<std::pair<std::int32_t, std::int32_t>> entries;  // offset, size of each frame of block 0
+    std::int32_t frameCount;                                    // the block header's claim
+    long long frames;                                           // delivered
+    long long bytes;
+    long long skipped;
+};
+
+void PrintTo(const FramesCase& c, std::ostream* out)
+{
+    *out << c.name;
+}
+
+class FramesTest : public DiskCheckTest, public ::testing::WithParamInterface<FramesCase> {};
+
+// What one block gives, whatever its index entries claim: never a byte
+// outside its payload area nor a byte twice, and no read per empty frame.
+TEST_P(FramesTest, BlockGivesAtMostItsPayloadAreaInThreeReads)
+{
+    dvrimage::Layout layout = SmallLayout();
+    layout.blockSizeShift = 16;  // a data block in 256 logical blocks: the format skips none inside it
+    layout.recordSum = GetParam().recordSum;
+    layout.adapterRecordsFrame = false;
+    image_ = std::make_unique<DiskImage>(layout);
+    image_->Add(GeneratedRecording(0, 0, 0, 100, 200, 8, 1, 100));
+    const std::string path = WriteImage(*image_);
+    const dvrimage::BlockHeaderBytes header = image_->MakeBlockHeader(0, GetParam().frameCount);
+    image_->WriteLogical(image_->DataBlockOffset(), header.data(), header.size());
+    for (std::size_t k = 0; k < GetParam().entries.size(); ++k) {
+        const auto [offset, size] = GetParam().entries[k];
+        const dvrimage::IndexEntryBytes entry = image_->MakeIndexEntry(offset, size);
+        image_->WriteLogical(image_->IndexEntryPosition(0, static_cast<std::int64_t>(k)), entry.data(), entry.size());
+    }
+    Refingerprint(path);
+    ASSERT_EQ(catalog_.BuildCatalog(wxString::FromUTF8(path.c_str())), CatalogBuild::kBuilt);
+    _HisiList_t recording{};
+    ASSERT_TRUE(dvrfstool::RecordingOfRow(catalog_, 0, &recording));
+
+    iotrace::Reset();
+    const dvrfstool::ExtractResult result =
+        dvrfstool::ExtractRecording(catalog_, recording, [](const dvrfstool::ExtractedFrame&) { return true; });
+    EXPECT_EQ(result.frames, GetParam().frames);
+    EXPECT_EQ(result.bytes, GetParam().bytes);
+    EXPECT_EQ(result.skippedFrames, GetParam().skipped);
+    // Header, index entries, payload: each piece of a read after the first
+    // goes on where the one before it ended, so a disk seeks three times.
+    int seeks = 0;
+    std::int64_t end = -1;
+    for (const iotrace::ReadCall& read : iotrace::Reads(path)) {
+        seeks += read.offset != end;
+        end = read.offset + static_cast<std::int64_t>(read.count);
+    }
+    EXPECT_LE(seeks, 3);
+}
+
+constexpr std::int32_t kArea = 16777088;
+
+INSTANTIATE_TEST_SUITE_P(
+    Blocks, FramesTest,
+    ::testing::Values(
+        FramesCase{"Consecutive", 0x5A, {{0, 100}, {100, 50}, {150, 10}}, 3, 3, 160, 0},
+        FramesCase{"OverlappingAnEarlierFrame", 0x5A, {{0, 100}, {50, 100}, {100, 10}}, 3, 2, 110, 1},
+        FramesCase{"PastThePayloadArea", 0x5A, {{0, 100}, {kArea - 10, 11}, {-1, 5}}, 3, 1, 100, 2},
+        FramesCase{"EachTheWholeArea", 0x5A, {{0, kArea}, {0, kArea}, {0, kArea}, {0, kArea}}, 4, 1, kArea, 3},
+        // Unwritten entries read as zeros, which pass where the record sum is 0.
+        FramesCase{"ThousandEmptyFrames", 0x00, {}, 1000, 1000, 100, 0}),
+    [](const ::testing::TestParamInfo<FramesCase>& info) { return std::string(info.param.name); });
 
 TEST_F(DiskCheckTest, VerificationReportsTheLyingHeader)
 {

@@ -123,9 +123,9 @@ void BM_Extract(benchmark::State& state)
     for (auto _ : state) {
         std::size_t bytes = 0;
         const dvrfstool::ExtractResult result = dvrfstool::ExtractRecording(
-            reader, recording, [&bytes](const unsigned char* data, std::size_t size) {
-                benchmark::DoNotOptimize(data[0]);
-                bytes += size;
+            reader, recording, [&bytes](const dvrfstool::ExtractedFrame& f) {
+                benchmark::DoNotOptimize(f.data[0]);
+                bytes += f.size;
                 return true;
             });
         if (result.frames != kExtractBlocks * kFramesPerBlock)

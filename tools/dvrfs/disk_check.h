@@ -8,6 +8,7 @@
 #include <cstdint>
 #include <functional>
 #include <string>
+#include <vector>
 
 #include "catalog/catalog_reader.h"
 
@@ -33,24 +34,47 @@ struct VerifyResult {
 VerifyResult VerifyDisk(CatalogReader& reader, const wxString& path,
                         const std::function<void(const std::string&)>& report);
 
+// A stretch of a recording that extraction left out: frames whose index
+// entry or payload is damaged, or a whole data block whose header is.
+struct LeftOut {
+    long long firstFrame = 0;  // place among the recording's frames of the first one left out
+    long long frames = 0;      // how many (0: a block whose frames are unknown)
+    long long block = -1;      // the data block, for a block left out whole
+};
+
 struct ExtractResult {
     long long frames = 0;
     long long bytes = 0;
-    long long skippedFrames = 0;  // frames whose index entry or payload could not be read
+    long long skippedFrames = 0;  // frames whose index entry or payload could not be read, or lies outside
     long long skippedBlocks = 0;  // blocks whose header could not be read
-    bool written = true;          // false when the sink refused a frame
+    std::vector<LeftOut> leftOut;  // in order; at most kMaxLeftOutKept, the rest only counted
+    bool written = true;           // false when the sink refused a frame
+};
+
+constexpr std::size_t kMaxLeftOutKept = 1000;
+
+// One frame as extraction hands it on.
+struct ExtractedFrame {
+    const unsigned char* data;
+    std::size_t size;
+    long long place;  // among the recording's frames, damaged ones counted
 };
 
 // The list entry of catalogue row `row` of a built catalogue, read again from
 // the disk; false when there is no such row or it cannot be read.
 bool RecordingOfRow(CatalogReader& reader, int row, _HisiList_t* recording);
 
-// Hands the payload of every frame of the recording to `sink`, in order, from
-// frame 0 of its first data block to the last frame of its last one, across
-// the end of the data ring when it wraps. Damaged frames and blocks are
-// passed over and counted. `progress` hears the fraction of blocks done.
+// Hands every frame of the recording to `sink`, in order, from frame 0 of its
+// first data block to the last frame of its last one, across the end of the
+// data ring when it wraps, at most one turn of the ring. Per block: its
+// header, its index entries in one read, and the payload of consecutive
+// frames in large reads. A frame whose entry is damaged, or whose payload
+// lies outside the payload area or over bytes an earlier frame of the block
+// delivered, is left out, as is a block whose header is damaged: so no block
+// gives more than its payload area. `progress` hears the fraction of blocks
+// done.
 ExtractResult ExtractRecording(CatalogReader& reader, const _HisiList_t& recording,
-                               const std::function<bool(const unsigned char*, std::size_t)>& sink,
+                               const std::function<bool(const ExtractedFrame&)>& sink,
                                const std::function<void(double)>& progress = {});
 
 }  // namespace dvrfstool

@@ -1,14 +1,155 @@
-// Taking a recording off the disk: its frames, in order, through the
-// reader's stream extraction.
+// Taking a recording off the disk: its frames, in order, block by block,
+// each block read as its header, its index entries in one read and the
+// payload of consecutive frames in one read, never more than the block's
+// payload area holds.
 #include <algorithm>
+#include <map>
 #include <vector>
 
+#include "dvrfs/record_math.h"
 #include "tools/dvrfs/disk_check.h"
 
 namespace dvrfstool {
 namespace {
 
+constexpr std::int64_t kDataBlockBytes = 1 << 24;
 constexpr std::int32_t kMaxFramesInBlock = 262142;
+
+struct FrameSpan {
+    std::int64_t place;   // among the recording's frames
+    std::int64_t offset;  // in the block's payload area
+    std::int64_t size;
+};
+
+class Extraction {
+public:
+    Extraction(CatalogReader& reader, const std::function<bool(const ExtractedFrame&)>& sink)
+        : reader_(reader), adapter_(*reader.m_volume->adapter), sink_(sink),
+          payload_(static_cast<std::size_t>(kPayloadAreaSize))
+    {
+    }
+
+    // False once the sink refused a frame.
+    bool Block(std::int64_t block)
+    {
+        _HisiBlockHeader_t header{};
+        if (reader_.BlockOpe(reader_.m_diskFile, 65, &header, block, 1) < 0) {
+            ++result_.skippedBlocks;
+            LeaveOut(place_, 0, block);
+            return true;
+        }
+        const std::int32_t count = std::clamp(header.FrameCount, 0, kMaxFramesInBlock);
+        const std::vector<FrameSpan> frames = SoundFrames(block, count);
+        place_ += count;
+        return Deliver(block, frames);
+    }
+
+    ExtractResult Result() const { return result_; }
+
+private:
+    // The frames of the block whose index entry is sound and whose payload
+    // lies inside the payload area, clear of every earlier frame's bytes.
+    std::vector<FrameSpan> SoundFrames(std::int64_t block, std::int32_t count)
+    {
+        std::vector<FrameSpan> frames;
+        if (count == 0)
+            return frames;
+        index_.resize(static_cast<std::size_t>(count));
+        const std::int64_t position =
+            dvrfs::RecordPosition(adapter_.DataBlockOffset, block + 1, kDataBlockBytes,
+                                  -static_cast<std::int64_t>(count) * kIndexEntrySize);
+        if (reader_.BlockRead(reader_.m_diskFile, position, reinterpret_cast<char*>(index_.data()),
+                              count * kIndexEntrySize) < 0) {
+            LeaveOut(place_, count, -1);
+            return frames;
+        }
+        std::map<std::int64_t, std::int64_t> taken;  // start -> end of the bytes delivered
+        for (std::int32_t k = 0; k < count; ++k) {
+            // The entries lie newest first: entry k is count - 1 - k places in.
+            _HisiHeader_t& entry = index_[static_cast<std::size_t>(count - 1 - k)];
+            const std::int64_t offset = entry.DataOffset;
+            const std::int64_t size = entry.DataSize;
+            if (!SumMatches(entry) || offset < 0 || size < 0 || offset + size > kPayloadAreaSize ||
+                Overlaps(taken, offset, size)) {
+                LeaveOut(place_ + k, 1, -1);
+                continue;
+            }
+            if (size > 0)
+                taken[offset] = offset + size;
+            frames.push_back({place_ + k, offset, size});
+        }
+        return frames;
+    }
+
+    bool SumMatches(_HisiHeader_t& entry)
+    {
+        const int sum = reader_.Checksum(reinterpret_cast<char*>(&entry), kIndexEntrySize);
+        return static_cast<std::uint8_t>(sum) == adapter_.RecordSum;
+    }
+
+    static bool Overlaps(const std::map<std::int64_t, std::int64_t>& taken, std::int64_t offset, std::int64_t size)
+    {
+        if (size == 0)
+            return false;
+        auto next = taken.lower_bound(offset);
+        if (next != taken.end() && next->first < offset + size)
+            return true;
+        return next != taken.begin() && std::prev(next)->second > offset;
+    }
+
+    // Frames that follow each other in the payload area are read together.
+    bool Deliver(std::int64_t block, const std::vector<FrameSpan>& frames)
+    {
+        for (std::size_t first = 0; first < frames.size();) {
+            std::size_t last = first;
+            while (last + 1 < frames.size() &&
+                   frames[last + 1].offset == frames[last].offset + frames[last].size)
+                ++last;
+            const std::int64_t start = frames[first].offset;
+            const std::int64_t bytes = frames[last].offset + frames[last].size - start;
+            const bool read = bytes == 0 || reader_.DataBlockOpe(reader_.m_diskFile, 'a', payload_.data(), block,
+                                                                 static_cast<int>(start), static_cast<int>(bytes)) > 0;
+            for (std::size_t i = first; i <= last; ++i) {
+                const FrameSpan& frame = frames[i];
+                if (!read) {
+                    LeaveOut(frame.place, 1, -1);
+                    continue;
+                }
+                const ExtractedFrame out{payload_.data() + (frame.offset - start),
+                                         static_cast<std::size_t>(frame.size), frame.place};
+                if (!sink_(out)) {
+                    result_.written = false;
+                    return false;
+                }
+                ++result_.frames;
+                result_.bytes += frame.size;
+            }
+            first = last + 1;
+        }
+        return true;
+    }
+
+    void LeaveOut(std::int64_t place, std::int64_t frames, std::int64_t block)
+    {
+        result_.skippedFrames += frames;
+        std::vector<LeftOut>& leftOut = result_.leftOut;
+        if (block < 0 && !leftOut.empty() && leftOut.back().block < 0 &&
+            leftOut.back().firstFrame + leftOut.back().frames == place) {
+            leftOut.back().frames += frames;
+            return;
+        }
+        if (leftOut.size() < kMaxLeftOutKept)
+            leftOut.push_back({place, frames, block});
+    }
+
+    CatalogReader& reader_;
+    const _HisiAdapter_t& adapter_;
+    const std::function<bool(const ExtractedFrame&)>& sink_;
+    std::vector<unsigned char> payload_;
+    std::vector<_HisiHeader_t> index_;
+    std::int64_t place_ = 0;
+    ExtractResult result_;
+};
 
 }  // namespace
 
@@ -21,12 +162,11 @@ bool RecordingOfRow(CatalogReader& reader, int row, _HisiList_t* recording)
 }
 
 ExtractResult ExtractRecording(CatalogReader& reader, const _HisiList_t& recording,
-                               const std::function<bool(const unsigned char*, std::size_t)>& sink,
+                               const std::function<bool(const ExtractedFrame&)>& sink,
                                const std::function<void(double)>& progress)
 {
-    ExtractResult result;
     if (!reader.m_volume || !reader.m_volume->adapter || reader.m_volume->adapter->DataBlockMax <= 0)
-        return result;
+        return ExtractResult{};
     const std::int64_t ringSize = reader.m_volume->adapter->DataBlockMax;
     const std::int64_t start = recording.StartBlock;
     std::int64_t last = recording.EndBlock;
@@ -34,49 +174,16 @@ ExtractResult ExtractRecording(CatalogReader& reader, const _HisiList_t& recordi
         last += ringSize;
     last = std::min(last, start + ringSize - 1);  // a recording never holds a block twice
 
-    std::vector<unsigned char> payload(static_cast<std::size_t>(kPayloadAreaSize));
-    reader.m_streamBlock = start;
-    reader.m_streamFrame = 0;
-    // Frames of the block under the cursor, read once per block; get_stream
-    // then delivers them one by one without leaving the block.
-    std::int64_t headerOf = -1;
-    std::int32_t framesInBlock = 0;
-    while (reader.m_streamBlock <= last) {
+    Extraction extraction(reader, sink);
+    for (std::int64_t n = start; n <= last; ++n) {
         if (progress)
-            progress(static_cast<double>(reader.m_streamBlock - start) / static_cast<double>(last - start + 1));
-        if (headerOf != reader.m_streamBlock) {
-            _HisiBlockHeader_t header{};
-            headerOf = reader.m_streamBlock;
-            const std::int64_t block = reader.m_streamBlock % ringSize;
-            if (reader.BlockOpe(reader.m_diskFile, 65, &header, block, 1) < 0) {
-                ++result.skippedBlocks;
-                ++reader.m_streamBlock;
-                continue;
-            }
-            framesInBlock = std::clamp(header.FrameCount, 0, kMaxFramesInBlock);
-            reader.m_streamFrame = 0;
-        }
-        if (reader.m_streamFrame >= framesInBlock) {
-            ++reader.m_streamBlock;
-            continue;
-        }
-        _HisiHeader_t frame{};
-        const int size = reader.get_stream(reader.m_diskFile, payload.data(), &frame, recording, recording, 1);
-        if (size < 0) {
-            ++result.skippedFrames;
-            ++reader.m_streamFrame;
-            continue;
-        }
-        if (!sink(payload.data(), static_cast<std::size_t>(size))) {
-            result.written = false;
+            progress(static_cast<double>(n - start) / static_cast<double>(last - start + 1));
+        if (!extraction.Block(dvrfs::ReduceInRing(n, ringSize)))
             break;
-        }
-        ++result.frames;
-        result.bytes += size;
     }
     if (progress)
         progress(1.0);
-    return result;
+    return extraction.Result();
 }
 
 }  // namespace dvrfstool

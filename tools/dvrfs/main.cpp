@@ -311,7 +311,7 @@ int Extract(const char* disk, const char* rowText, const char* output, bool forc
     {
         ProgressBar bar;
         result = dvrfstool::ExtractRecording(
-            reader, recording, [fd](const unsigned char* data, std::size_t size) { return WriteAll(fd, data, size); },
+            reader, recording, [fd](const dvrfstool::ExtractedFrame& f) { return WriteAll(fd, f.data, f.size); },
             [&bar](double fraction) { bar.Show(fraction); });
     }
     const bool closed = ::close(fd) == 0;

@@ -182,32 +182,40 @@ private:
             else if (!mirrorSound)
                 Damaged(name + " (mirror copy)");
             if (ringSound || mirrorSound)
-                recordings_.push_back(ringSound ? ring : mirror);
+                AddRecordingBlocks(ringSound ? ring : mirror);
         }
     }
 
-    void CheckRecordings()
+    // The data blocks a recording claims, as runs of block numbers inside the
+    // ring (a recording across the end of the ring is two runs).
+    void AddRecordingBlocks(const _HisiList_t& recording)
     {
         const std::int64_t ringSize = Adapter().DataBlockMax;
         if (ringSize <= 0)
             return;
-        blockSeen_.assign(static_cast<std::size_t>(ringSize), false);
-        for (const _HisiList_t& recording : recordings_) {
-            const std::int64_t start = recording.StartBlock;
-            std::int64_t end = recording.EndBlock;
-            if (end < start)
-                end += ringSize;
-            if (start < 0 || start >= ringSize || end < start || end >= start + ringSize) {
-                Damaged("list entry " + std::to_string(recording.Idx) + " (data blocks outside the data ring)");
-                continue;
-            }
-            for (std::int64_t n = start; n <= end; ++n) {
-                const std::int64_t block = n % ringSize;
-                if (!blockSeen_[static_cast<std::size_t>(block)]) {
-                    blockSeen_[static_cast<std::size_t>(block)] = true;
-                    CheckDataBlock(block);
-                }
-            }
+        const std::int64_t start = recording.StartBlock;
+        std::int64_t end = recording.EndBlock;
+        if (end < start)
+            end += ringSize;
+        if (start < 0 || start >= ringSize || end < start || end >= start + ringSize) {
+            Damaged("list entry " + std::to_string(recording.Idx) + " (data blocks outside the data ring)");
+            return;
+        }
+        claimed_.push_back({start, std::min(end, ringSize - 1)});
+        if (end >= ringSize)
+            claimed_.push_back({0, end - ringSize});
+    }
+
+    // Each claimed block once, in block order, however many recordings claim
+    // it: the work is the list span plus the data ring, not their product.
+    void CheckRecordings()
+    {
+        std::sort(claimed_.begin(), claimed_.end());
+        std::int64_t next = 0;  // every block below it is checked
+        for (const auto& [first, last] : claimed_) {
+            for (std::int64_t block = std::max(first, next); block <= last; ++block)
+                CheckDataBlock(block);
+            next = std::max(next, last + 1);
         }
     }
 
@@ -252,8 +260,7 @@ private:
     CatalogReader& reader_;
     const std::function<void(const std::string&)>& report_;
     VerifyResult result_;
-    std::vector<_HisiList_t> recordings_;
-    std::vector<bool> blockSeen_;
+    std::vector<std::pair<std::int64_t, std::int64_t>> claimed_;  // runs of claimed blocks, first and last
     std::vector<_HisiHeader_t> index_;
 };
 
