@@ -1,10 +1,11 @@
 #!/usr/bin/env bash
 # End to end: mkdvrfs writes disks, every dvrfs command reads them; output and
 # exit statuses compared exactly.
-#   dvrfs_cli_test.sh MKDVRFS DVRFS
+#   dvrfs_cli_test.sh MKDVRFS DVRFS CLIP
 set -u
 mkdvrfs=$1
 dvrfs=$2
+clip=$3
 work=$(mktemp -d)
 trap 'rm -rf "$work"' EXIT
 failures=0
@@ -109,7 +110,7 @@ check "list of a damaged superblock" 1 $?
 err=$("$dvrfs" list "$work/noadapter.img" 2>&1)
 check "list without an adapter" 1 $?
 check "list without an adapter says so" \
-  "dvrfs: $work/noadapter.img: no current state record: a record lies outside the disk (code 36: FUNCTION[1141])" "$err"
+  "dvrfs: $work/noadapter.img: no valid state record of the recorder found (reader's code 36: FUNCTION[1141])" "$err"
 
 # --- verify
 out=$("$dvrfs" verify "$work/one.img")
@@ -170,6 +171,44 @@ check "the disk is untouched" "$before" "$(cksum < "$work/play.img")"
 check "extract of a row that is no number" 2 $?
 test ! -e "$work/none.es" && test ! -e "$work/x.es"
 check "refused extracts write nothing" 0 $?
+
+# --- the command line
+"$dvrfs" --version | grep -q '^dvrfs '
+check "dvrfs --version" 0 $?
+for command in info list verify extract export hash; do
+  "$dvrfs" "$command" --help | grep -q "^Usage: dvrfs $command"
+  check "dvrfs $command --help" 0 $?
+done
+err=$("$dvrfs" lsit "$work/one.img" 2>&1)
+check "an unknown command is named" "dvrfs: no command 'lsit'
+Try 'dvrfs --help'." "$err"
+check "options before the disk" "$("$dvrfs" list "$work/one.img" --json)" "$("$dvrfs" list --json "$work/one.img")"
+
+# --- export: the sample clip's frames, 25 a second, a key frame a second
+"$mkdvrfs" --h264 "$clip" --recording 0:0:1:1700000000:1700000002:25 \
+  --recording 1:2:4:1700003600:1700003603:25 --damage header:3 "$work/clip.img" >/dev/null
+mkdir "$work/out"
+out=$("$dvrfs" export "$work/clip.img" 0 -o "$work/out")
+check "export of a sound recording" 0 $?
+check "export says what it wrote and its digest" "$work/out/row0-20231114T221320Z.mp4: row 0, 50 frames, 2.0 s from 2023-11-14T22:13:20Z, 25 frames/s (the stream's timing)
+sha256 $(sha256sum < "$work/out/row0-20231114T221320Z.mp4" | cut -c1-64)  $work/out/row0-20231114T221320Z.mp4" "$out"
+(cd "$work/out" && sha256sum -c --quiet row0-20231114T221320Z.mp4.sha256)
+check "the .sha256 file checks" 0 $?
+err=$("$dvrfs" export "$work/clip.img" 1 -o "$work/out/one.mkv" --format mkv 2>&1 >/dev/null)
+check "export that left a damaged block out" 4 $?
+check "export names the block it left out, with its time" \
+  "dvrfs: warning: row 1: data block 3 left out (header damaged), after 2023-11-14T23:13:21Z" "$err"
+"$dvrfs" export "$work/clip.img" 0 -o "$work/out/row0-20231114T221320Z.mp4" 2>/dev/null
+check "export refuses to replace a file" 2 $?
+"$dvrfs" export "$work/clip.img" 0 -o "$work/no/such/folder.mp4" 2>/dev/null
+check "export that cannot write its output" 5 $?
+"$dvrfs" export "$work/clip.img" 0 -o - 2>/dev/null | head -c 8 | tail -c 4 | grep -q ftyp
+check "export -o - writes an MP4 to standard output" 0 $?
+out=$("$dvrfs" export "$work/clip.img" --from 1700000001 --to 2023-11-14T23:13:21Z -o "$work/range/" 2>/dev/null | grep -c '^sha256')
+check "export of a time range: each recording that overlaps it" 2 "$out"
+
+# --- hash
+check "hash is the disk's SHA-256" "$(sha256sum "$work/one.img")" "$("$dvrfs" hash "$work/one.img")"
 
 echo "$((checks - failures)) passed, $failures failed"
 [ "$failures" -eq 0 ]

@@ -10,41 +10,87 @@
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
+#include <map>
+#include <set>
 #include <string>
 #include <vector>
 
 #include "catalog/catalog_reader.h"
+#include "tools/dvrfs/command_line.h"
 #include "tools/dvrfs/disk_check.h"
+#include "tools/dvrfs/export.h"
 
 namespace {
 
-enum ExitStatus { kOk = 0, kDiskUnreadable = 1, kUsageError = 2, kDamageFound = 3 };
+using namespace dvrfscli;
+
+const char kVersion[] = "dvrfs 1.1 (morvane)\n";
 
 const char kHelp[] = R"(Usage: dvrfs COMMAND DISK [OPTION]...
-Look at a recorder's disk (a device or an image file), read-only.
+Look at a recorder's disk (a device, a raw image file) read-only, and hand
+its recordings on. Options may stand before or after the operands.
 
 Commands:
-  info DISK [--dump]          the superblock and the current adapter, one
-                              key=value a line; --dump adds the adapter dump
-  list DISK [--json]          the recordings, as the playback panel lists them:
-                              ROW, IDX, START, END (seconds since 1970, UTC),
-                              DATE TIME (UTC), tab-separated; or one JSON object
-  verify DISK                 read every record once and report each damaged
-                              or repaired one, then a summary
-  extract DISK ROW -o FILE [--force]
-                              write the frames of recording ROW (as listed) to
-                              FILE, in order; an existing FILE is replaced only
-                              with --force
+  info DISK [--dump]          the superblock and the current adapter
+  list DISK [--json]          the recordings, as the playback panel lists them
+  verify DISK                 read every record once, report damage
+  extract DISK ROW -o FILE    the frames of a recording as the raw stream
+  export DISK ROW... [-o FILE|DIR] [--format mp4|mkv|h264]
+  export DISK --from TIME --to TIME [-o DIR]
+                              recordings as MP4 files with their real time,
+                              each with its SHA-256
+  hash DISK                   the SHA-256 of the whole disk or image
+
+'dvrfs COMMAND --help' says more of each; 'dvrfs --version' names this one.
 
 Exit status: 0 success; 1 the disk cannot be opened or read as a recorder
-disk; 2 usage error; 3 verify found damage.
+disk; 2 usage error; 3 verify found damage; 4 export left damaged frames or
+blocks out; 5 an output could not be written.
 )";
 
-int UsageError(const std::string& message)
-{
-    std::fprintf(stderr, "dvrfs: %s\nTry 'dvrfs --help'.\n", message.c_str());
-    return kUsageError;
-}
+const std::map<std::string, std::string> kCommandHelp = {
+    {"info", R"(Usage: dvrfs info DISK [--dump]
+The superblock and the current adapter, one key=value a line;
+superblock_copy says whether the primary or the backup copy was read.
+--dump adds the reader's adapter dump.
+)"},
+    {"list", R"(Usage: dvrfs list DISK [--json]
+The recordings, as the playback panel lists them: ROW, IDX, START, END
+(seconds since 1970, UTC), DATE TIME (UTC), tab-separated; --json prints one
+object. Entries damaged in both copies are skipped and named on standard
+error (and under "skipped" in the JSON).
+)"},
+    {"verify", R"(Usage: dvrfs verify DISK
+Reads every record once (both superblock copies, the 120 adapter slots, the
+list entries of the span in the ring and the mirror, each claimed data
+block's header and index) and reports each damaged or repaired one, then a
+summary. Exit status 3 when it found damage.
+)"},
+    {"extract", R"(Usage: dvrfs extract DISK ROW -o FILE [--force]
+Writes the frames of recording ROW (as listed) to FILE, in order, as the raw
+H.264 stream; '-o -' writes to standard output. An existing FILE is replaced
+only with --force. Damaged frames and blocks are left out with a warning.
+)"},
+    {"export", R"(Usage: dvrfs export DISK ROW... [-o FILE|DIR] [--format mp4|mkv|h264] [--force]
+       dvrfs export DISK --from TIME --to TIME [-o DIR] [--format ...]
+Remuxes recordings, without re-encoding, into MP4 (default), Matroska or the
+raw H.264 stream, timed by the stream's own frame rate (or the recording's
+frames over its duration) and with the recording's start as the file's
+creation time. Files are named rowROW-STARTZ.EXT (UTC, ISO 8601 without
+colons) in DIR (default: the current folder); one ROW may name a FILE, or
+'-' for standard output. With --from/--to (seconds since 1970, or
+YYYY-MM-DDTHH:MM:SSZ) every recording that overlaps the range is exported,
+from the key frame at or before its start. Each file's SHA-256 is printed
+and written beside it as FILE.sha256 (sha256sum -c). Damaged frames and
+blocks are left out, named in a warning with their time; the exit status is
+then 4.
+)"},
+    {"hash", R"(Usage: dvrfs hash DISK
+The SHA-256 of the whole disk or image, read once from start to end, in the
+format of sha256sum; a progress bar on a terminal.
+)"},
+};
+
 
 const char* PlainWords(std::int32_t code)
 {
@@ -84,19 +130,6 @@ int NotConfigured(const char* disk)
 {
     std::fflush(stdout);
     std::fprintf(stderr, "dvrfs: %s: no recorder was ever configured on this disk\n", disk);
-    return kDiskUnreadable;
-}
-
-// Builds the catalogue as the panel does; a status other than kOk when the
-// disk cannot be read as a recorder disk.
-int BuildCatalog(CatalogReader& reader, const char* disk)
-{
-    switch (reader.BuildCatalog(wxString::FromUTF8(disk))) {
-    case CatalogBuild::kBuilt: return kOk;
-    case CatalogBuild::kNotOpened: return CannotRead(disk, "not a recorder disk", reader);
-    case CatalogBuild::kNotConfigured: return NotConfigured(disk);
-    case CatalogBuild::kNoAdapter: return CannotRead(disk, "no current state record", reader);
-    }
     return kDiskUnreadable;
 }
 
@@ -222,54 +255,15 @@ int Verify(const char* disk)
     return result.damaged + result.repaired > 0 ? kDamageFound : kOk;
 }
 
-// A progress bar on standard error, redrawn at most ten times a second, and
-// only when standard error is a terminal.
-class ProgressBar {
-public:
-    ProgressBar() : shown_(isatty(STDERR_FILENO) != 0) {}
-    void Show(double fraction)
-    {
-        const auto now = std::chrono::steady_clock::now();
-        if (!shown_ || (fraction < 1.0 && now - last_ < std::chrono::milliseconds(100)))
-            return;
-        last_ = now;
-        const int width = 40;
-        const int done = static_cast<int>(fraction * width);
-        std::fprintf(stderr, "\r[%s%s] %3d%%", std::string(done, '#').c_str(), std::string(width - done, ' ').c_str(),
-                     static_cast<int>(fraction * 100));
-        drawn_ = true;
-    }
-    ~ProgressBar()
-    {
-        if (drawn_)
-            std::fputc('\n', stderr);
-    }
-
-private:
-    bool shown_;
-    bool drawn_ = false;
-    std::chrono::steady_clock::time_point last_{};
-};
-
-// Opens the output file; refuses the disk itself, any block device and,
-// without --force, an existing file.
+// Opens the output file, after CheckOutput.
 int OpenOutput(const char* disk, const char* output, bool force, int* fd)
 {
-    struct stat diskInfo {};
-    struct stat outputInfo {};
-    if (::stat(output, &outputInfo) == 0) {
-        if (::stat(disk, &diskInfo) == 0 && diskInfo.st_dev == outputInfo.st_dev &&
-            diskInfo.st_ino == outputInfo.st_ino)
-            return UsageError(std::string("refusing to write into the disk itself: ") + output);
-        if (S_ISBLK(outputInfo.st_mode) || S_ISCHR(outputInfo.st_mode))
-            return UsageError(std::string("refusing to write to a device: ") + output);
-        if (!force)
-            return UsageError(std::string(output) + " exists; add --force to replace it");
-    }
+    if (const int status = CheckOutput(disk, output, force); status != kOk)
+        return status;
     *fd = ::open(output, O_WRONLY | O_CREAT | O_CLOEXEC | (force ? O_TRUNC : O_EXCL), 0644);
     if (*fd < 0) {
         std::fprintf(stderr, "dvrfs: cannot write %s: %s\n", output, std::strerror(errno));
-        return kDiskUnreadable;
+        return kOutputFailed;
     }
     return kOk;
 }
@@ -304,9 +298,12 @@ int Extract(const char* disk, const char* rowText, const char* output, bool forc
     if (!dvrfstool::RecordingOfRow(reader, static_cast<int>(row), &recording))
         return CannotRead(disk, "the recording's entry cannot be read", reader);
 
-    int fd = -1;
-    if (const int status = OpenOutput(disk, output, force, &fd); status != kOk)
-        return status;
+    const bool toStdout = std::strcmp(output, "-") == 0;
+    int fd = STDOUT_FILENO;
+    if (!toStdout) {
+        if (const int status = OpenOutput(disk, output, force, &fd); status != kOk)
+            return status;
+    }
     dvrfstool::ExtractResult result;
     {
         ProgressBar bar;
@@ -314,12 +311,14 @@ int Extract(const char* disk, const char* rowText, const char* output, bool forc
             reader, recording, [fd](const dvrfstool::ExtractedFrame& f) { return WriteAll(fd, f.data, f.size); },
             [&bar](double fraction) { bar.Show(fraction); });
     }
-    const bool closed = ::close(fd) == 0;
+    const bool closed = toStdout || ::close(fd) == 0;
     if (!result.written || !closed) {
         std::fprintf(stderr, "dvrfs: cannot write %s: %s\n", output, std::strerror(errno));
-        return kDiskUnreadable;
+        return kOutputFailed;
     }
-    std::printf("%lld frames, %lld bytes written to %s\n", result.frames, result.bytes, output);
+    // On standard output the stream is the output: the count goes to standard error.
+    std::fprintf(toStdout ? stderr : stdout, "%lld frames, %lld bytes written to %s\n", result.frames, result.bytes,
+                 output);
     if (result.skippedFrames + result.skippedBlocks > 0)
         std::fprintf(stderr, "dvrfs: warning: %lld damaged frame(s) and %lld damaged block(s) left out\n",
                      result.skippedFrames, result.skippedBlocks);
@@ -330,34 +329,47 @@ int Extract(const char* disk, const char* rowText, const char* output, bool forc
 
 int main(int argc, char** argv)
 {
-    const std::vector<std::string> args(argv + 1, argv + argc);
-    if (!args.empty() && (args[0] == "--help" || args[0] == "-h")) {
+    CommandLine line;
+    if (!ParseCommandLine(argc, argv, &line))
+        return kUsageError;
+    if (line.Has("--version")) {
+        std::fputs(kVersion, stdout);
+        return kOk;
+    }
+    if (line.command.empty() || (line.Has("--help") && !kCommandHelp.count(line.command))) {
+        if (!line.Has("--help") && line.command.empty())
+            return UsageError("expected a command and a disk");
         std::fputs(kHelp, stdout);
         return kOk;
     }
-    if (args.size() < 2)
-        return UsageError("expected a command and a disk");
-    const std::string& command = args[0];
-    const char* disk = argv[2];
-    if (command == "info" && (args.size() == 2 || (args.size() == 3 && args[2] == "--dump")))
-        return Info(disk, args.size() == 3);
-    if (command == "list" && (args.size() == 2 || (args.size() == 3 && args[2] == "--json")))
-        return List(disk, args.size() == 3);
-    if (command == "verify" && args.size() == 2)
-        return Verify(disk);
-    if (command == "extract" && args.size() >= 5) {
-        const char* output = nullptr;
-        bool force = false;
-        for (std::size_t i = 3; i < args.size(); ++i) {
-            if (args[i] == "--force")
-                force = true;
-            else if (args[i] == "-o" && i + 1 < args.size())
-                output = argv[1 + ++i];
-            else
-                return UsageError("unexpected argument: " + args[i]);
-        }
-        if (output)
-            return Extract(disk, argv[3], output, force);
+    if (!kCommandHelp.count(line.command))
+        return UsageError("no command '" + line.command + "'");
+    if (line.Has("--help")) {
+        std::fputs(kCommandHelp.at(line.command).c_str(), stdout);
+        return kOk;
     }
-    return UsageError("cannot make sense of the arguments");
+    static const std::map<std::string, std::set<std::string>> kFlags = {
+        {"info", {"--dump"}}, {"list", {"--json"}}, {"verify", {}},
+        {"extract", {"--force"}}, {"export", {"--force"}}, {"hash", {}},
+    };
+    for (const std::string& flag : line.flags)
+        if (!kFlags.at(line.command).count(flag))
+            return UsageError("'" + line.command + "' takes no option " + flag);
+    if (line.operands.empty())
+        return UsageError("'" + line.command + "' needs a disk");
+    const std::string& disk = line.operands[0];
+    const std::size_t operands = line.operands.size();
+    if (line.command == "info" && operands == 1)
+        return Info(disk.c_str(), line.Has("--dump"));
+    if (line.command == "list" && operands == 1)
+        return List(disk.c_str(), line.Has("--json"));
+    if (line.command == "verify" && operands == 1)
+        return Verify(disk.c_str());
+    if (line.command == "extract" && operands == 2 && line.Value("-o"))
+        return Extract(disk.c_str(), line.operands[1].c_str(), line.Value("-o")->c_str(), line.Has("--force"));
+    if (line.command == "export")
+        return ExportCommand(line);
+    if (line.command == "hash" && operands == 1)
+        return HashCommand(disk);
+    return UsageError("cannot make sense of the arguments of '" + line.command + "'");
 }

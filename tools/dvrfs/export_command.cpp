@@ -1,0 +1,232 @@
+// dvrfs export and dvrfs hash: recordings handed on as files a player opens,
+// each with its SHA-256, and the SHA-256 of the whole disk.
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <cmath>
+#include <cstdio>
+#include <cstdlib>
+#include <cstring>
+#include <ctime>
+#include <filesystem>
+#include <fstream>
+
+#include "tools/dvrfs/command_line.h"
+#include "tools/dvrfs/export.h"
+
+namespace dvrfscli {
+namespace {
+
+// Seconds since 1970, or YYYY-MM-DDTHH:MM:SS with an optional Z (UTC).
+bool ParseTime(const std::string& text, std::uint32_t* seconds)
+{
+    char* end = nullptr;
+    const unsigned long long plain = std::strtoull(text.c_str(), &end, 10);
+    if (!text.empty() && *end == '\0' && plain <= UINT32_MAX) {
+        *seconds = static_cast<std::uint32_t>(plain);
+        return true;
+    }
+    std::tm tm{};
+    const char* rest = strptime(text.c_str(), "%Y-%m-%dT%H:%M:%S", &tm);
+    if (!rest || (*rest != '\0' && std::strcmp(rest, "Z") != 0))
+        return false;
+    const std::time_t t = timegm(&tm);
+    if (t < 0 || t > static_cast<std::time_t>(UINT32_MAX))
+        return false;
+    *seconds = static_cast<std::uint32_t>(t);
+    return true;
+}
+
+// "row3-20231115T021320Z.mp4"
+std::string FileName(int row, std::uint32_t start, dvrfstool::ExportFormat format)
+{
+    const std::time_t t = start;
+    std::tm tm{};
+    gmtime_r(&t, &tm);
+    char stamp[24];
+    std::strftime(stamp, sizeof stamp, "%Y%m%dT%H%M%SZ", &tm);
+    return "row" + std::to_string(row) + "-" + stamp + "." + dvrfstool::Extension(format);
+}
+
+bool IsDirectory(const std::string& path)
+{
+    struct stat info {};
+    return (!path.empty() && path.back() == '/') || (::stat(path.c_str(), &info) == 0 && S_ISDIR(info.st_mode));
+}
+
+std::string BaseName(const std::string& path)
+{
+    const std::size_t slash = path.rfind('/');
+    return slash == std::string::npos ? path : path.substr(slash + 1);
+}
+
+// The rows to export: those named, or those whose recording overlaps the range.
+bool ChooseRows(const CommandLine& line, const CatalogReader& reader, const dvrfstool::ExportRequest& request,
+                std::vector<int>* rows)
+{
+    for (std::size_t i = 1; i < line.operands.size(); ++i) {
+        char* end = nullptr;
+        const long row = std::strtol(line.operands[i].c_str(), &end, 10);
+        if (line.operands[i].empty() || *end != '\0' || row < 0) {
+            UsageError("not a row number: " + line.operands[i]);
+            return false;
+        }
+        if (row >= reader.m_recordCount) {
+            UsageError("no row " + std::to_string(row) + ": the disk lists " + std::to_string(reader.m_recordCount) +
+                       " recording(s)");
+            return false;
+        }
+        rows->push_back(static_cast<int>(row));
+    }
+    if (!request.from)
+        return true;
+    for (int row = 0; row < reader.m_recordCount; ++row) {
+        const CatalogEntry& entry = reader.m_catalog->Entries[row];
+        if (static_cast<std::uint32_t>(entry.EndTime) >= *request.from &&
+            static_cast<std::uint32_t>(entry.StartTime) < *request.to)
+            rows->push_back(row);
+    }
+    return true;
+}
+
+// Names each stretch that was left out, with the time it covers.
+void WarnLeftOut(int row, const dvrfstool::ExportOutcome& outcome, std::uint32_t start)
+{
+    const double fps = outcome.framesPerSecond > 0 ? outcome.framesPerSecond : 25.0;
+    auto time = [&](long long place) { return dvrfstool::IsoUtc(start + place / fps); };
+    for (const dvrfstool::LeftOut& gap : outcome.extracted.leftOut) {
+        if (gap.block >= 0)
+            std::fprintf(stderr, "dvrfs: warning: row %d: data block %lld left out (header damaged), after %s\n", row,
+                         gap.block, time(gap.firstFrame).c_str());
+        else
+            std::fprintf(stderr, "dvrfs: warning: row %d: %lld frame(s) left out (damaged), %s to %s\n", row,
+                         gap.frames, time(gap.firstFrame).c_str(), time(gap.firstFrame + gap.frames).c_str());
+    }
+    if (outcome.framesBeforeAKeyFrame > 0)
+        std::fprintf(stderr, "dvrfs: warning: row %d: %lld frame(s) before the first key frame left out\n", row,
+                     outcome.framesBeforeAKeyFrame);
+}
+
+// Exports one row; kOk, kLeftOut or kOutputFailed.
+int ExportRow(CatalogReader& reader, const std::string& disk, int row, const std::string& output, bool force,
+              dvrfstool::ExportRequest request)
+{
+    _HisiList_t recording{};
+    if (!dvrfstool::RecordingOfRow(reader, row, &recording)) {
+        std::fprintf(stderr, "dvrfs: %s: row %d: its recording entry cannot be read any more\n", disk.c_str(), row);
+        return kLeftOut;
+    }
+    if (output != "-") {
+        if (const int status = CheckOutput(disk, output, force); status != kOk)
+            return status;
+    }
+    request.output = output;
+    dvrfstool::ExportOutcome outcome;
+    {
+        ProgressBar bar;
+        outcome = dvrfstool::ExportRecording(reader, recording, request, [&bar](double f) { bar.Show(f); });
+    }
+    if (!outcome.error.empty()) {
+        std::fprintf(stderr, "dvrfs: cannot write %s: %s\n", output.c_str(), outcome.error.c_str());
+        return kOutputFailed;
+    }
+    FILE* say = output == "-" ? stderr : stdout;
+    std::fprintf(say, "%s: row %d, %lld frames, %.1f s from %s, %.3g frames/s (%s)\n", output.c_str(), row,
+                 outcome.framesWritten, outcome.seconds, dvrfstool::IsoUtc(outcome.firstTime).c_str(),
+                 outcome.framesPerSecond, outcome.timingFromStream ? "the stream's timing" : "the recording's times");
+    if (output != "-") {
+        const std::string digest = dvrfstool::Sha256OfFile(output);
+        std::ofstream sidecar(output + ".sha256");
+        sidecar << digest << "  " << BaseName(output) << "\n";
+        if (digest.empty() || !sidecar.flush()) {
+            std::fprintf(stderr, "dvrfs: cannot write %s.sha256\n", output.c_str());
+            return kOutputFailed;
+        }
+        std::printf("sha256 %s  %s\n", digest.c_str(), output.c_str());
+    }
+    WarnLeftOut(row, outcome, recording.StartTime);
+    const bool complete = outcome.extracted.leftOut.empty() && outcome.extracted.skippedFrames == 0 &&
+                          outcome.extracted.skippedBlocks == 0 && outcome.framesBeforeAKeyFrame == 0;
+    return complete ? kOk : kLeftOut;
+}
+
+}  // namespace
+
+int ExportCommand(const CommandLine& line)
+{
+    const std::string& disk = line.operands[0];
+    dvrfstool::ExportRequest request;
+    if (const std::string* format = line.Value("--format"); format && !ParseExportFormat(*format, &request.format))
+        return UsageError("no format '" + *format + "': mp4, mkv or h264");
+    const std::string* from = line.Value("--from");
+    const std::string* to = line.Value("--to");
+    if ((from != nullptr) != (to != nullptr))
+        return UsageError("--from and --to go together");
+    if (from) {
+        std::uint32_t a = 0;
+        std::uint32_t b = 0;
+        if (!ParseTime(*from, &a) || !ParseTime(*to, &b) || b <= a)
+            return UsageError("--from and --to take two times, the first before the second");
+        if (line.operands.size() > 1)
+            return UsageError("export takes rows or a time range, not both");
+        request.from = a;
+        request.to = b;
+    } else if (line.operands.size() < 2) {
+        return UsageError("export needs the rows to export, or --from and --to");
+    }
+
+    CatalogReader reader;
+    if (const int status = BuildCatalog(reader, disk); status != kOk)
+        return status;
+    std::vector<int> rows;
+    if (!ChooseRows(line, reader, request, &rows))
+        return kUsageError;
+    if (rows.empty()) {
+        std::fprintf(stderr, "dvrfs: %s: no recording lies in that time range\n", disk.c_str());
+        return kOk;
+    }
+    const std::string target = line.Value("-o") ? *line.Value("-o") : ".";
+    if (target.size() > 1 && target.back() == '/') {
+        std::error_code error;
+        std::filesystem::create_directories(target, error);  // a folder named as one is made
+    }
+    const bool intoFolder = IsDirectory(target);
+    if (!intoFolder && rows.size() > 1)
+        return UsageError(target + " is no folder: several recordings need one");
+    int status = kOk;
+    for (int row : rows) {
+        const std::uint32_t start = static_cast<std::uint32_t>(reader.m_catalog->Entries[row].StartTime);
+        const std::string output =
+            intoFolder ? target + (target.back() == '/' ? "" : "/") + FileName(row, start, request.format) : target;
+        const int result = ExportRow(reader, disk, row, output, line.Has("--force"), request);
+        if (result == kOutputFailed || result == kUsageError)
+            return result;
+        status = std::max(status, result);
+    }
+    return status;
+}
+
+int HashCommand(const std::string& disk)
+{
+    struct stat info {};
+    std::uint64_t size = 0;
+    if (::stat(disk.c_str(), &info) == 0)
+        size = static_cast<std::uint64_t>(info.st_size);
+    std::string digest;
+    {
+        ProgressBar bar;
+        digest = dvrfstool::Sha256OfFile(disk, [&bar, size](std::uint64_t done) {
+            if (size > 0)
+                bar.Show(static_cast<double>(done) / static_cast<double>(size));
+        });
+    }
+    if (digest.empty()) {
+        std::fprintf(stderr, "dvrfs: %s: cannot read: %s\n", disk.c_str(), std::strerror(errno ? errno : EIO));
+        return kDiskUnreadable;
+    }
+    std::printf("%s  %s\n", digest.c_str(), disk.c_str());
+    return kOk;
+}
+
+}  // namespace dvrfscli
