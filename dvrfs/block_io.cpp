@@ -4,7 +4,7 @@
 #include <cinttypes>
 #include <climits>
 #include <cstring>
-#include <vector>
+#include <memory>
 
 #include <wx/log.h>
 
@@ -46,12 +46,14 @@ int DvrDiskReader::HddataRead(wxFile* file, char* dest, wxUint64 offset, unsigne
     wxLogNull quiet;
     if (file->Seek(static_cast<wxFileOffset>(start), wxFromStart) < 0)
         return -1;
-    // Zero-filled, so that whatever a short read does not reach arrives as zeros.
-    std::vector<char> sectors((lastSector - firstSector + 1) * kSectorSize);
-    const ssize_t got = file->Read(sectors.data(), sectors.size());
+    const std::size_t span = (lastSector - firstSector + 1) * kSectorSize;
+    std::unique_ptr<char[]> sectors(new char[span]);
+    const ssize_t got = file->Read(sectors.get(), span);
     if (got <= 0)
         return -1;
-    std::memcpy(dest, sectors.data() + (offset - start), length);
+    // Whatever a short read did not reach arrives as zeros.
+    std::memset(sectors.get() + got, 0, span - static_cast<std::size_t>(got));
+    std::memcpy(dest, sectors.get() + (offset - start), length);
     return 1;
 }
 
@@ -84,16 +86,15 @@ int DvrDiskReader::BlockRead(wxFile* file, wxInt64 position, char* dest, int len
 
     // One device read per logical block touched: the device results are not
     // looked at, the XOR sums of the records read are what catch a bad read.
-    // Cleared first, so that a piece the device does not deliver fails the
+    // A piece the device does not deliver is cleared, so that it fails the
     // record's sum instead of passing off what the buffer held before; a read
     // refused above leaves the buffer as it was.
-    ClearRecords(dest, length);
     wxInt64 inside = position & super.BlockMask;
     wxInt64 remaining = length;
     for (wxInt64 block = position >> super.BlockSizeShift; block <= last; ++block) {
         const wxInt64 chunk = block == last ? remaining : super.BlockSize - inside;
-        HddataRead(file, dest, PhysicalBlockStart(super, block) + inside,
-                   static_cast<unsigned long>(chunk));
+        if (HddataRead(file, dest, PhysicalBlockStart(super, block) + inside, static_cast<unsigned long>(chunk)) < 0)
+            ClearRecords(dest, static_cast<int>(chunk));
         dest += chunk;
         remaining -= chunk;
         inside = 0;
