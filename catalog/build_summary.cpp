@@ -43,6 +43,9 @@ std::string Size(long double bytes)
 // reader's own open reports only that it failed.
 std::string WhyNotOpened(const std::string& path)
 {
+    std::string imageError;
+    if (!dvrfs::OpenImageSource(path, &imageError) && !imageError.empty())
+        return "cannot open the image: " + imageError;
     const int fd = ::open(path.c_str(), O_RDONLY | O_CLOEXEC);
     const int error = fd < 0 ? errno : 0;
     if (fd >= 0)

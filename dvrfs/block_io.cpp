@@ -43,12 +43,17 @@ int DvrDiskReader::HddataRead(wxFile* file, char* dest, wxUint64 offset, unsigne
     if (start > static_cast<wxUint64>(INT64_MAX))
         return -1;
 
-    wxLogNull quiet;
-    if (file->Seek(static_cast<wxFileOffset>(start), wxFromStart) < 0)
-        return -1;
     const std::size_t span = (lastSector - firstSector + 1) * kSectorSize;
     std::unique_ptr<char[]> sectors(new char[span]);
-    const ssize_t got = file->Read(sectors.get(), span);
+    long long got = 0;
+    if (m_imageSource) {
+        got = m_imageSource->Read(start, sectors.get(), span);
+    } else {
+        wxLogNull quiet;
+        if (file->Seek(static_cast<wxFileOffset>(start), wxFromStart) < 0)
+            return -1;
+        got = file->Read(sectors.get(), span);
+    }
     if (got <= 0)
         return -1;
     // Whatever a short read did not reach arrives as zeros.

@@ -10,6 +10,7 @@
 #define DVRFS_DVR_DISK_READER_H
 
 #include <cstdint>
+#include <memory>
 
 #include <wx/file.h>
 #include <wx/string.h>
@@ -17,6 +18,7 @@
 #include "catalog/record_catalog.h"
 #include "dvrfs/dvr_volume.h"
 #include "dvrfs/dvrfs_records.h"
+#include "dvrfs/image_source.h"
 
 // Codes of the error register.
 enum DvrErrorCode : std::int32_t {
@@ -115,6 +117,9 @@ public:
     wxInt64 m_streamBlock;
     std::int32_t m_streamFrame;
     wxFile* m_diskFile;
+    // Where the bytes come from when the disk is a split raw or an E01
+    // image; null for a device or raw image, read through m_diskFile.
+    std::unique_ptr<dvrfs::ImageSource> m_imageSource;
 
 private:
     // Error register.

@@ -73,6 +73,12 @@ int DvrDiskReader::OpenDVRFS(wxString path)
         if (!m_diskFile->Open(path, wxFile::read, wxS_DEFAULT))
             return 0;
     }
+    std::string sourceError;
+    m_imageSource = OpenImageSource(path.utf8_string(), &sourceError);
+    if (!m_imageSource && !sourceError.empty()) {
+        m_diskFile->Close();  // an image of a known kind that does not open is no disk
+        return 0;
+    }
     m_catalog->Opened = 1;
     m_catalog->Opened2 = 1;
 
@@ -120,6 +126,7 @@ void DvrDiskReader::CloseDVRFS()
 {
     delete m_volume;
     m_volume = nullptr;
+    m_imageSource.reset();
     if (m_diskFile) {
         m_diskFile->Close();
         delete m_diskFile;

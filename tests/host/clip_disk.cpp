@@ -2,10 +2,10 @@
 
 
 dvrimage::DiskImage WriteClipDisk(const std::string& path, const std::vector<ClipRecording>& recordings,
-                                  int dataBlocks)
+                                  int dataBlocks, const std::string& clip)
 {
     const std::vector<std::vector<std::uint8_t>> frames =
-        dvrimage::AccessUnitsOfFile(MORVANE_SOURCE_DIR "/samples/clip.h264");
+        dvrimage::AccessUnitsOfFile(MORVANE_SOURCE_DIR "/samples/" + clip);
     dvrimage::Layout layout;
     layout.dataBlockMax = dataBlocks;
     dvrimage::DiskImage image(layout);

@@ -17,7 +17,8 @@ struct ClipRecording {
 };
 
 // Writes the image and returns the writer, for damage after writing.
+// `clip` names a stream of samples/.
 dvrimage::DiskImage WriteClipDisk(const std::string& path, const std::vector<ClipRecording>& recordings,
-                                  int dataBlocks = 16);
+                                  int dataBlocks = 16, const std::string& clip = "clip.h264");
 
 #endif

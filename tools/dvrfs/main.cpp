@@ -147,6 +147,13 @@ int Info(const char* disk, bool dump)
     std::printf("offset_block_space=%llu\n", static_cast<unsigned long long>(super.OffsetBlockSpace));
     std::printf("super_offset=%llu\n", static_cast<unsigned long long>(super.SuperOffset));
     std::printf("super_offset_backup=%llu\n", static_cast<unsigned long long>(super.SuperOffsetBackup));
+    if (reader.m_imageSource) {
+        std::printf("image=%s\n", reader.m_imageSource->Kind().c_str());
+        for (const auto& [key, value] : reader.m_imageSource->Facts())
+            std::printf("image_%s=%s\n", key.c_str(), value.c_str());
+    } else {
+        std::printf("image=raw\n");
+    }
     const bool onBackup = reader.m_volume->copyInUse != SuperBlockCopy::kPrimary;
     std::printf("superblock_copy=%s\n", onBackup ? "backup" : "primary");
 

@@ -1,0 +1,218 @@
+#include "dvrfs/image_source.h"
+
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cctype>
+#include <cstdio>
+
+#include <libewf.h>
+
+namespace dvrfs {
+namespace {
+
+bool EndsWith(const std::string& text, const std::string& tail)
+{
+    if (text.size() < tail.size())
+        return false;
+    return std::equal(tail.rbegin(), tail.rend(), text.rbegin(),
+                      [](char a, char b) { return std::tolower(a) == std::tolower(b); });
+}
+
+// The pieces of a split raw image, one after the other: piece k holds the
+// bytes from the sum of the sizes before it.
+class SplitRawSource : public ImageSource {
+public:
+    ~SplitRawSource() override
+    {
+        for (const Piece& piece : m_pieces)
+            ::close(piece.fd);
+    }
+
+    bool Add(const std::string& path)
+    {
+        const int fd = ::open(path.c_str(), O_RDONLY | O_CLOEXEC);
+        struct stat info {};
+        if (fd < 0 || ::fstat(fd, &info) != 0 || !S_ISREG(info.st_mode)) {
+            if (fd >= 0)
+                ::close(fd);
+            return false;
+        }
+        m_pieces.push_back({fd, m_size, static_cast<std::uint64_t>(info.st_size)});
+        m_size += static_cast<std::uint64_t>(info.st_size);
+        return true;
+    }
+
+    long long Read(std::uint64_t offset, char* dest, std::size_t size) override
+    {
+        long long done = 0;
+        for (const Piece& piece : m_pieces) {
+            if (size == 0)
+                break;
+            if (offset >= piece.start + piece.size || offset < piece.start)
+                continue;
+            const std::size_t wanted =
+                static_cast<std::size_t>(std::min<std::uint64_t>(size, piece.start + piece.size - offset));
+            const ssize_t got = ::pread(piece.fd, dest, wanted, static_cast<off_t>(offset - piece.start));
+            if (got < 0)
+                return done > 0 ? done : -1;
+            done += got;
+            if (static_cast<std::size_t>(got) < wanted)
+                break;  // the piece is shorter than it was: the rest is not there
+            dest += got;
+            offset += static_cast<std::uint64_t>(got);
+            size -= static_cast<std::size_t>(got);
+        }
+        return done;
+    }
+
+    std::uint64_t Size() const override { return m_size; }
+
+    std::string Kind() const override
+    {
+        return "split raw image, " + std::to_string(m_pieces.size()) + (m_pieces.size() == 1 ? " piece" : " pieces");
+    }
+
+private:
+    struct Piece {
+        int fd;
+        std::uint64_t start;
+        std::uint64_t size;
+    };
+    std::vector<Piece> m_pieces;
+    std::uint64_t m_size = 0;
+};
+
+std::unique_ptr<ImageSource> OpenSplitRaw(const std::string& first, std::string* error)
+{
+    auto source = std::make_unique<SplitRawSource>();
+    const std::string base = first.substr(0, first.size() - 3);
+    for (int k = 1; k <= 999; ++k) {
+        char number[8];
+        std::snprintf(number, sizeof number, "%03d", k);
+        if (!source->Add(base + number)) {
+            if (k == 1) {
+                *error = "the first piece cannot be read";
+                return nullptr;
+            }
+            break;
+        }
+    }
+    return source;
+}
+
+std::string EwfError(libewf_error_t* error)
+{
+    char text[512] = "unknown error";
+    if (error) {
+        libewf_error_sprint(error, text, sizeof text);
+        libewf_error_free(&error);
+    }
+    return text;
+}
+
+// An Expert Witness image through libewf, which finds its segments from the
+// first one's name and checks each chunk as it reads it.
+class EwfSource : public ImageSource {
+public:
+    ~EwfSource() override
+    {
+        if (m_handle) {
+            libewf_handle_close(m_handle, nullptr);
+            libewf_handle_free(&m_handle, nullptr);
+        }
+    }
+
+    bool Open(const std::string& first, std::string* message)
+    {
+        libewf_error_t* error = nullptr;
+        char** names = nullptr;
+        int count = 0;
+        if (libewf_glob(first.c_str(), first.size(), LIBEWF_FORMAT_UNKNOWN, &names, &count, &error) != 1) {
+            *message = EwfError(error);
+            return false;
+        }
+        m_segments = count;
+        const bool opened = libewf_handle_initialize(&m_handle, &error) == 1 &&
+                            libewf_handle_open(m_handle, names, count, LIBEWF_OPEN_READ, &error) == 1 &&
+                            libewf_handle_get_media_size(m_handle, &m_size, &error) == 1;
+        libewf_glob_free(names, count, nullptr);
+        if (!opened)
+            *message = EwfError(error);
+        return opened;
+    }
+
+    long long Read(std::uint64_t offset, char* dest, std::size_t size) override
+    {
+        if (offset >= m_size)
+            return 0;
+        libewf_error_t* error = nullptr;
+        const ssize_t got = libewf_handle_read_random(m_handle, dest, size, static_cast<off64_t>(offset), &error);
+        if (got < 0) {
+            libewf_error_free(&error);
+            return -1;
+        }
+        // Where libewf checks a chunk's checksum, it hands a failing chunk on
+        // and only counts it: such a chunk reads as an unreadable sector.
+        std::uint32_t errors = 0;
+        if (libewf_handle_get_number_of_checksum_errors(m_handle, &errors, nullptr) == 1 && errors > m_checksumErrors) {
+            m_checksumErrors = errors;
+            return -1;
+        }
+        return got;
+    }
+
+    std::uint64_t Size() const override { return m_size; }
+
+    std::string Kind() const override
+    {
+        return "E01 image, " + std::to_string(m_segments) + (m_segments == 1 ? " segment" : " segments");
+    }
+
+    std::vector<std::pair<std::string, std::string>> Facts() const override
+    {
+        std::vector<std::pair<std::string, std::string>> facts = {{"media_size", std::to_string(m_size)}};
+        std::uint8_t md5[16];
+        if (libewf_handle_get_md5_hash(m_handle, md5, sizeof md5, nullptr) == 1) {
+            std::string hex;
+            for (std::uint8_t byte : md5) {
+                char two[3];
+                std::snprintf(two, sizeof two, "%02x", byte);
+                hex += two;
+            }
+            facts.push_back({"stored_md5", hex});
+        }
+        for (const char* name : {"acquiry_date", "case_number", "examiner_name", "acquiry_software_version"}) {
+            std::uint8_t value[256] = {};
+            if (libewf_handle_get_utf8_header_value(m_handle, reinterpret_cast<const std::uint8_t*>(name),
+                                                    std::char_traits<char>::length(name), value, sizeof value,
+                                                    nullptr) == 1)
+                facts.push_back({name, reinterpret_cast<const char*>(value)});
+        }
+        return facts;
+    }
+
+private:
+    libewf_handle_t* m_handle = nullptr;
+    size64_t m_size = 0;
+    int m_segments = 0;
+    std::uint32_t m_checksumErrors = 0;  // as libewf counted them so far
+};
+
+}  // namespace
+
+std::unique_ptr<ImageSource> OpenImageSource(const std::string& path, std::string* error)
+{
+    if (EndsWith(path, ".001"))
+        return OpenSplitRaw(path, error);
+    if (EndsWith(path, ".e01")) {
+        auto source = std::make_unique<EwfSource>();
+        if (source->Open(path, error))
+            return source;
+    }
+    return nullptr;
+}
+
+}  // namespace dvrfs
