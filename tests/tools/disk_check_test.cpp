@@ -7,6 +7,7 @@
 #include "tests/support/disk_fixture.h"
 #include "tests/support/io_trace.h"
 #include "tools/dvrfs/disk_check.h"
+#include "tools/dvrfs/recover.h"
 
 namespace {
 
@@ -144,6 +145,63 @@ TEST_F(DiskCheckTest, VerificationReportsTheLyingHeader)
     EXPECT_EQ(result.stage, dvrfstool::VerifyStage::kComplete);
     EXPECT_EQ(lines, (std::vector<std::string>{"damaged: data block 1 header (frame count 2147483647)"}));
     EXPECT_EQ(result.damaged, 1);
+}
+
+}  // namespace
+
+namespace {
+
+// A recorder's disk after its list ring wrapped: two older recordings whose
+// entries were written over keep their blocks (0 to 1, and 2), a third
+// recording's entry is damaged in both copies (block 7); recover finds
+// exactly those blocks, in the time between the listed recordings around
+// them, and their frames extract.
+TEST_F(DiskCheckTest, RecoverFindsTheBlocksTheIndexLost)
+{
+    dvrimage::Layout layout = SmallLayout();
+    layout.dataBlockMax = 12;
+    image_ = std::make_unique<DiskImage>(layout);
+    auto overwritten = [](std::int32_t first, std::int32_t last, std::uint32_t start) {
+        dvrimage::Recording r = GeneratedRecording(0, first, last, start, start + 60, 12, 3, 100);
+        r.listed = false;
+        return r;
+    };
+    image_->Add(overwritten(0, 1, 1000));
+    image_->Add(overwritten(2, 2, 2000));
+    image_->Add(GeneratedRecording(0, 3, 4, 3000, 3060, 12, 3, 100));
+    image_->Add(GeneratedRecording(1, 5, 6, 4000, 4060, 12, 3, 100));
+    image_->Add(GeneratedRecording(2, 7, 7, 5000, 5060, 12, 3, 100));
+    image_->Add(GeneratedRecording(3, 8, 8, 6000, 6060, 12, 3, 100));
+    const std::string path = WriteImage(*image_);
+    image_->Damage(dvrimage::Target::ListEntry, 2);
+    image_->Damage(dvrimage::Target::ListMirror, 2);
+    Refingerprint(path);
+    ASSERT_EQ(catalog_.BuildCatalog(wxString::FromUTF8(path.c_str())), CatalogBuild::kBuilt);
+
+    iotrace::Reset();
+    const dvrfstool::RecoverResult result = dvrfstool::FindUnlistedRuns(catalog_);
+    ASSERT_EQ(result.runs.size(), 2u);
+    EXPECT_EQ(result.runs[0].firstBlock, 0);
+    EXPECT_EQ(result.runs[0].lastBlock, 2);
+    EXPECT_EQ(result.runs[0].frames, 9);
+    EXPECT_FALSE(result.runs[0].after.has_value());  // the oldest data on the disk
+    EXPECT_EQ(result.runs[0].before, 3000u);
+    EXPECT_EQ(result.runs[1].firstBlock, 7);
+    EXPECT_EQ(result.runs[1].lastBlock, 7);
+    EXPECT_EQ(result.runs[1].after, 4060u);
+    EXPECT_EQ(result.runs[1].before, 6000u);
+    EXPECT_EQ(result.blocksScanned, 12);
+    EXPECT_EQ(result.headersRead, 12 - 5);  // one per block no listed recording covers
+    EXPECT_EQ(iotrace::Reads(path).size(), 3u + 7u);  // the rows' entries, then those headers
+
+    std::vector<unsigned char> stream;
+    const dvrfstool::ExtractResult extracted = dvrfstool::ExtractRecording(
+        catalog_, dvrfstool::RecordingOfBlocks(0, 2), [&stream](const dvrfstool::ExtractedFrame& f) {
+            stream.insert(stream.end(), f.data, f.data + f.size);
+            return true;
+        });
+    EXPECT_EQ(extracted.frames, 9);
+    EXPECT_EQ(std::vector<unsigned char>(stream.begin(), stream.begin() + 100), dvrimage::PatternPayload(0, 0, 100));
 }
 
 }  // namespace

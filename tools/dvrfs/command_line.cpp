@@ -11,7 +11,7 @@ namespace dvrfscli {
 
 bool ParseCommandLine(int argc, char** argv, CommandLine* line)
 {
-    static const std::set<std::string> kTakeValue = {"-o", "--format", "--from", "--to"};
+    static const std::set<std::string> kTakeValue = {"-o", "--format", "--from", "--to", "--blocks"};
     bool optionsEnded = false;
     for (int i = 1; i < argc; ++i) {
         const std::string arg = argv[i];

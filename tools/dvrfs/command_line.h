@@ -5,6 +5,7 @@
 #define TOOLS_DVRFS_COMMAND_LINE_H
 
 #include <chrono>
+#include <cstdint>
 #include <map>
 #include <set>
 #include <string>
@@ -27,7 +28,7 @@ enum ExitStatus {
 struct CommandLine {
     std::string command;
     std::vector<std::string> operands;
-    std::map<std::string, std::string> values;  // -o, --format, --from, --to
+    std::map<std::string, std::string> values;  // -o, --format, --from, --to, --blocks
     std::set<std::string> flags;                // --json, --dump, --force, --help, ...
 
     bool Has(const std::string& flag) const { return flags.count(flag) != 0; }
@@ -65,9 +66,13 @@ int CheckOutput(const std::string& disk, const std::string& output, bool force);
 // recorder disk, says why on standard error and returns kDiskUnreadable.
 int BuildCatalog(CatalogReader& reader, const std::string& disk);
 
-// The evidence commands: export and hash.
+// The evidence commands: export, hash, recover.
 int ExportCommand(const CommandLine& line);
 int HashCommand(const std::string& disk);
+int RecoverCommand(const std::string& disk, bool json);
+
+// "FIRST:LAST" of --blocks; false when it is not two block numbers.
+bool ParseBlocks(const std::string& text, std::int32_t* first, std::int32_t* last);
 
 }  // namespace dvrfscli
 

@@ -151,7 +151,8 @@ public:
         std::copy(sets.begin(), sets.end(), parameters->extradata);
         parameters->extradata_size = static_cast<int>(sets.size());
         stream_->time_base = kTimeBase;
-        av_dict_set(&output_->metadata, "creation_time", IsoUtc(creationTime).c_str(), 0);
+        if (creationTime != 0)  // 0: a run of blocks whose time no list entry gives
+            av_dict_set(&output_->metadata, "creation_time", IsoUtc(creationTime).c_str(), 0);
         if ((status = avio_open(&output_->pb, target.c_str(), AVIO_FLAG_WRITE)) < 0)
             return AvError(status);
         AVDictionary* options = nullptr;
@@ -291,6 +292,8 @@ private:
 
     double TimeOf(long long place) const
     {
+        if (recording_.StartTime == 0)
+            return 0;  // no known time: none is claimed
         return recording_.StartTime + (outcome_.framesPerSecond > 0 ? place / outcome_.framesPerSecond : 0.0);
     }
 

@@ -4,6 +4,7 @@
 #include <unistd.h>
 
 #include <cerrno>
+#include <climits>
 #include <cmath>
 #include <cstdio>
 #include <cstdlib>
@@ -14,6 +15,7 @@
 
 #include "tools/dvrfs/command_line.h"
 #include "tools/dvrfs/export.h"
+#include "tools/dvrfs/recover.h"
 
 namespace dvrfscli {
 namespace {
@@ -151,7 +153,89 @@ int ExportRow(CatalogReader& reader, const std::string& disk, int row, const std
     return complete ? kOk : kLeftOut;
 }
 
+// Exports a run of blocks no list entry describes, as recover lists them:
+// timed by the stream alone, with no creation time claimed.
+int ExportBlocks(const CommandLine& line, const std::string& disk, const std::string& blocks,
+                 dvrfstool::ExportRequest request)
+{
+    std::int32_t first = 0;
+    std::int32_t last = 0;
+    if (!ParseBlocks(blocks, &first, &last) || line.operands.size() > 1 || line.Value("--from"))
+        return UsageError("--blocks takes FIRST:LAST, and no rows or time range beside it");
+    CatalogReader reader;
+    if (const int status = BuildCatalog(reader, disk); status != kOk)
+        return status;
+    const std::string target = line.Value("-o") ? *line.Value("-o") : ".";
+    const std::string name = "blocks" + std::to_string(first) + "-" + std::to_string(last) + "." +
+                             dvrfstool::Extension(request.format);
+    const std::string output = IsDirectory(target) ? target + (target.back() == '/' ? "" : "/") + name : target;
+    if (output != "-") {
+        if (const int status = CheckOutput(disk, output, line.Has("--force")); status != kOk)
+            return status;
+    }
+    request.output = output;
+    const dvrfstool::ExportOutcome outcome =
+        dvrfstool::ExportRecording(reader, dvrfstool::RecordingOfBlocks(first, last), request);
+    if (!outcome.error.empty()) {
+        std::fprintf(stderr, "dvrfs: cannot write %s: %s\n", output.c_str(), outcome.error.c_str());
+        return kOutputFailed;
+    }
+    std::fprintf(output == "-" ? stderr : stdout, "%s: blocks %d to %d, %lld frames, %.1f s, %.3g frames/s\n",
+                 output.c_str(), first, last, outcome.framesWritten, outcome.seconds, outcome.framesPerSecond);
+    return outcome.extracted.skippedFrames + outcome.extracted.skippedBlocks > 0 ? kLeftOut : kOk;
+}
+
 }  // namespace
+
+bool ParseBlocks(const std::string& text, std::int32_t* first, std::int32_t* last)
+{
+    char* end = nullptr;
+    const long a = std::strtol(text.c_str(), &end, 10);
+    if (end == text.c_str() || *end != ':')
+        return false;
+    const char* second = end + 1;
+    const long b = std::strtol(second, &end, 10);
+    if (end == second || *end != '\0' || a < 0 || b < 0 || a > INT32_MAX || b > INT32_MAX)
+        return false;
+    *first = static_cast<std::int32_t>(a);
+    *last = static_cast<std::int32_t>(b);
+    return true;
+}
+
+int RecoverCommand(const std::string& disk, bool json)
+{
+    CatalogReader reader;
+    if (const int status = BuildCatalog(reader, disk); status != kOk)
+        return status;
+    const dvrfstool::RecoverResult result = dvrfstool::FindUnlistedRuns(reader);
+    auto when = [json](const std::optional<std::uint32_t>& t) {
+        if (!t)
+            return std::string(json ? "null" : "-");
+        return json ? "\"" + dvrfstool::IsoUtc(*t) + "\"" : dvrfstool::IsoUtc(*t);
+    };
+    if (json) {
+        std::printf("{\"blocks_scanned\": %lld, \"headers_read\": %lld, \"runs\": [",
+                    static_cast<long long>(result.blocksScanned), static_cast<long long>(result.headersRead));
+        for (std::size_t i = 0; i < result.runs.size(); ++i) {
+            const dvrfstool::UnlistedRun& run = result.runs[i];
+            std::printf("%s{\"first_block\": %lld, \"last_block\": %lld, \"blocks\": %lld, \"frames\": %lld, "
+                        "\"after\": %s, \"before\": %s}",
+                        i ? ", " : "", static_cast<long long>(run.firstBlock), static_cast<long long>(run.lastBlock),
+                        static_cast<long long>(run.blocks), run.frames, when(run.after).c_str(),
+                        when(run.before).c_str());
+        }
+        std::printf("]}\n");
+        return kOk;
+    }
+    for (const dvrfstool::UnlistedRun& run : result.runs)
+        std::printf("blocks %lld:%lld\t%lld blocks\t%lld frames\tafter %s\tbefore %s\n",
+                    static_cast<long long>(run.firstBlock), static_cast<long long>(run.lastBlock),
+                    static_cast<long long>(run.blocks), run.frames, when(run.after).c_str(), when(run.before).c_str());
+    std::fprintf(stderr, "dvrfs: %zu run(s) of unlisted blocks; %lld blocks scanned, %lld headers read (UTC)\n",
+                 result.runs.size(), static_cast<long long>(result.blocksScanned),
+                 static_cast<long long>(result.headersRead));
+    return kOk;
+}
 
 int ExportCommand(const CommandLine& line)
 {
@@ -159,6 +243,8 @@ int ExportCommand(const CommandLine& line)
     dvrfstool::ExportRequest request;
     if (const std::string* format = line.Value("--format"); format && !ParseExportFormat(*format, &request.format))
         return UsageError("no format '" + *format + "': mp4, mkv or h264");
+    if (const std::string* blocks = line.Value("--blocks"))
+        return ExportBlocks(line, disk, *blocks, request);
     const std::string* from = line.Value("--from");
     const std::string* to = line.Value("--to");
     if ((from != nullptr) != (to != nullptr))

@@ -19,6 +19,7 @@
 #include "tools/dvrfs/command_line.h"
 #include "tools/dvrfs/disk_check.h"
 #include "tools/dvrfs/export.h"
+#include "tools/dvrfs/recover.h"
 
 namespace {
 
@@ -27,8 +28,9 @@ using namespace dvrfscli;
 const char kVersion[] = "dvrfs 1.1 (morvane)\n";
 
 const char kHelp[] = R"(Usage: dvrfs COMMAND DISK [OPTION]...
-Look at a recorder's disk (a device, a raw image file) read-only, and hand
-its recordings on. Options may stand before or after the operands.
+Look at a recorder's disk (a device, a raw image, a split raw image by its
+.001 piece, an E01 image by its .E01 segment) read-only, and hand its
+recordings on. Options may stand before or after the operands.
 
 Commands:
   info DISK [--dump]          the superblock and the current adapter
@@ -40,6 +42,7 @@ Commands:
                               recordings as MP4 files with their real time,
                               each with its SHA-256
   hash DISK                   the SHA-256 of the whole disk or image
+  recover DISK [--json]       runs of data blocks no listed recording covers
 
 'dvrfs COMMAND --help' says more of each; 'dvrfs --version' names this one.
 
@@ -84,6 +87,16 @@ from the key frame at or before its start. Each file's SHA-256 is printed
 and written beside it as FILE.sha256 (sha256sum -c). Damaged frames and
 blocks are left out, named in a warning with their time; the exit status is
 then 4.
+)"},
+    {"recover", R"(Usage: dvrfs recover DISK [--json]
+Scans the header of every data block of the data ring once (one 128-byte
+read per 16 MiB block) and lists the runs of consecutive blocks whose header
+is sound but which no listed recording covers: what the recorder's index
+lost when its list ring wrote over older entries, or when an entry is
+damaged. Each run: its blocks, its frames, and the time it must lie in
+(after the end of the listed recording before it, before the start of the
+one after, UTC). 'extract --blocks FIRST:LAST' and 'export --blocks
+FIRST:LAST' take such a run.
 )"},
     {"hash", R"(Usage: dvrfs hash DISK
 The SHA-256 of the whole disk or image, read once from start to end, in the
@@ -289,21 +302,33 @@ bool WriteAll(int fd, const unsigned char* data, std::size_t size)
     return true;
 }
 
-int Extract(const char* disk, const char* rowText, const char* output, bool force)
+// The frames of a row, or with `blocks` of a run of blocks as recover
+// lists them.
+int Extract(const char* disk, const char* rowText, const char* output, bool force, const std::string& blocks = "")
 {
-    char* end = nullptr;
-    const long row = std::strtol(rowText, &end, 10);
-    if (*rowText == '\0' || *end != '\0' || row < 0)
-        return UsageError(std::string("not a row number: ") + rowText);
+    std::int32_t first = 0;
+    std::int32_t last = 0;
+    long row = 0;
+    if (!blocks.empty()) {
+        if (!ParseBlocks(blocks, &first, &last))
+            return UsageError("--blocks takes FIRST:LAST");
+    } else {
+        char* end = nullptr;
+        row = std::strtol(rowText, &end, 10);
+        if (*rowText == '\0' || *end != '\0' || row < 0)
+            return UsageError(std::string("not a row number: ") + rowText);
+    }
     CatalogReader reader;
     if (const int status = BuildCatalog(reader, disk); status != kOk)
         return status;
-    if (row >= reader.m_recordCount)
-        return UsageError("no row " + std::to_string(row) + ": the disk lists " +
-                          std::to_string(reader.m_recordCount) + " recording(s)");
-    _HisiList_t recording{};
-    if (!dvrfstool::RecordingOfRow(reader, static_cast<int>(row), &recording))
-        return CannotRead(disk, "the recording's entry cannot be read", reader);
+    _HisiList_t recording = dvrfstool::RecordingOfBlocks(first, last);
+    if (blocks.empty()) {
+        if (row >= reader.m_recordCount)
+            return UsageError("no row " + std::to_string(row) + ": the disk lists " +
+                              std::to_string(reader.m_recordCount) + " recording(s)");
+        if (!dvrfstool::RecordingOfRow(reader, static_cast<int>(row), &recording))
+            return CannotRead(disk, "the recording's entry cannot be read", reader);
+    }
 
     const bool toStdout = std::strcmp(output, "-") == 0;
     int fd = STDOUT_FILENO;
@@ -357,7 +382,7 @@ int main(int argc, char** argv)
     }
     static const std::map<std::string, std::set<std::string>> kFlags = {
         {"info", {"--dump"}}, {"list", {"--json"}}, {"verify", {}},
-        {"extract", {"--force"}}, {"export", {"--force"}}, {"hash", {}},
+        {"extract", {"--force"}}, {"export", {"--force"}}, {"hash", {}}, {"recover", {"--json"}},
     };
     for (const std::string& flag : line.flags)
         if (!kFlags.at(line.command).count(flag))
@@ -372,11 +397,15 @@ int main(int argc, char** argv)
         return List(disk.c_str(), line.Has("--json"));
     if (line.command == "verify" && operands == 1)
         return Verify(disk.c_str());
-    if (line.command == "extract" && operands == 2 && line.Value("-o"))
+    if (line.command == "extract" && operands == 2 && line.Value("-o") && !line.Value("--blocks"))
         return Extract(disk.c_str(), line.operands[1].c_str(), line.Value("-o")->c_str(), line.Has("--force"));
+    if (line.command == "extract" && operands == 1 && line.Value("-o") && line.Value("--blocks"))
+        return Extract(disk.c_str(), nullptr, line.Value("-o")->c_str(), line.Has("--force"), *line.Value("--blocks"));
     if (line.command == "export")
         return ExportCommand(line);
     if (line.command == "hash" && operands == 1)
         return HashCommand(disk);
+    if (line.command == "recover" && operands == 1)
+        return RecoverCommand(disk, line.Has("--json"));
     return UsageError("cannot make sense of the arguments of '" + line.command + "'");
 }

@@ -281,13 +281,17 @@ std::vector<std::uint8_t> DiskImage::AdapterBytes(int slot, int positionInRun) c
     BlockHeaderBytes header{};
     IndexEntryBytes frame{};
     std::uint32_t startTime = 0, endTime = 0;
-    if (recordings_.empty()) {
+    std::vector<const Recording*> listed;
+    for (const Recording& r : recordings_)
+        if (r.listed)
+            listed.push_back(&r);
+    if (listed.empty()) {
         first = MakeListEntry(-1, 0, 0, 0, 0);
         last = first;
         Put32(frame, 4, 0xFFFFFFFFu);
     } else {
-        const Recording& oldest = recordings_.front();
-        const Recording& newest = recordings_.back();
+        const Recording& oldest = *listed.front();
+        const Recording& newest = *listed.back();
         first = MakeListEntry(oldest.listIdx, oldest.startBlock, oldest.endBlock, oldest.startTime, oldest.endTime);
         last = MakeListEntry(newest.listIdx, newest.startBlock, newest.endBlock, newest.startTime, newest.endTime);
         const std::vector<Frame>& frames = newest.blocks.empty() ? std::vector<Frame>{} : newest.blocks.back();
@@ -303,9 +307,9 @@ std::vector<std::uint8_t> DiskImage::AdapterBytes(int slot, int positionInRun) c
         }
         startTime = oldest.startTime;
         endTime = oldest.endTime;
-        for (const Recording& r : recordings_) {
-            startTime = std::min(startTime, r.startTime);
-            endTime = std::max(endTime, r.endTime);
+        for (const Recording* r : listed) {
+            startTime = std::min(startTime, r->startTime);
+            endTime = std::max(endTime, r->endTime);
         }
     }
     startTime = layout_.startTime.value_or(startTime);
@@ -360,9 +364,11 @@ std::int32_t DiskImage::BlockNumber(const Recording& recording, std::size_t i) c
 
 void DiskImage::WriteRecording(const Recording& r)
 {
-    const ListEntryBytes entry = MakeListEntry(r.listIdx, r.startBlock, r.endBlock, r.startTime, r.endTime);
-    WriteLogical(listOffset_ + static_cast<std::uint64_t>(r.listIdx) * 128, entry.data(), entry.size());
-    WriteLogical(listOffsetBackup_ + static_cast<std::uint64_t>(r.listIdx) * 128, entry.data(), entry.size());
+    if (r.listed) {
+        const ListEntryBytes entry = MakeListEntry(r.listIdx, r.startBlock, r.endBlock, r.startTime, r.endTime);
+        WriteLogical(listOffset_ + static_cast<std::uint64_t>(r.listIdx) * 128, entry.data(), entry.size());
+        WriteLogical(listOffsetBackup_ + static_cast<std::uint64_t>(r.listIdx) * 128, entry.data(), entry.size());
+    }
 
     for (std::size_t i = 0; i < r.blocks.size(); ++i) {
         const std::int32_t block = BlockNumber(r, i);

@@ -40,6 +40,9 @@ struct Recording {
     std::uint32_t startTime = 0;
     std::uint32_t endTime = 0;
     std::vector<std::vector<Frame>> blocks;
+    // False for a recording whose list entry the recorder has since written
+    // over: its blocks are on the disk, its entry is not.
+    bool listed = true;
 };
 
 // A run of consecutive adapter slots, wrapping past slot 119.

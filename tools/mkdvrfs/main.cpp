@@ -45,6 +45,10 @@ Recordings, in list order, oldest first (repeatable):
                           across the end of the data ring), recorded from T0
                           to T1 (seconds since 1970-01-01 UTC), with FRAMES
                           frames of SIZE bytes in each block (default 3 x 1000)
+  --overwritten START:END:T0:T1[:FRAMES[:SIZE]]
+                          a recording whose list entry the recorder has since
+                          written over: its data blocks are written, its entry
+                          is not (as after the list ring wrapped)
   --frames FILE           take the frame payloads from FILE, in order, instead
                           of generating them (SIZE of --recording is ignored)
   --frame-size N          with --frames: cut FILE into frames of N bytes
@@ -118,6 +122,20 @@ RecordingArg ParseRecording(const std::string& text)
         arg.framesPerBlock = static_cast<int>(v[5]);
     if (v.size() > 6)
         arg.frameSize = static_cast<std::size_t>(v[6]);
+    return arg;
+}
+
+// A recording without a list entry: its blocks only.
+RecordingArg ParseOverwritten(const std::string& text)
+{
+    const std::vector<long long> v = Numbers(text, "--overwritten");
+    if (v.size() < 4 || v.size() > 6)
+        UsageError("--overwritten takes START:END:T0:T1[:FRAMES[:SIZE]]");
+    std::string asRecording = "0";
+    for (long long n : v)
+        asRecording += ":" + std::to_string(n);
+    RecordingArg arg = ParseRecording(asRecording);
+    arg.recording.listed = false;
     return arg;
 }
 
@@ -202,7 +220,8 @@ int main(int argc, char** argv)
 {
     enum {
         kBlockSizeShift = 1000, kBlockCount, kBlockSpaceOffset, kBackupOffset, kTableCount, kListMax,
-        kDataBlocks, kAdapterRun, kVersion, kRecordSum, kNoFrame, kRecording, kFrames, kFrameSize, kDamage, kH264,
+        kDataBlocks, kAdapterRun, kVersion, kRecordSum, kNoFrame, kRecording, kOverwritten, kFrames, kFrameSize, kDamage,
+        kH264,
     };
     static const option options[] = {
         {"block-size-shift", required_argument, nullptr, kBlockSizeShift},
@@ -217,6 +236,7 @@ int main(int argc, char** argv)
         {"record-sum", required_argument, nullptr, kRecordSum},
         {"no-frame", no_argument, nullptr, kNoFrame},
         {"recording", required_argument, nullptr, kRecording},
+        {"overwritten", required_argument, nullptr, kOverwritten},
         {"frames", required_argument, nullptr, kFrames},
         {"frame-size", required_argument, nullptr, kFrameSize},
         {"damage", required_argument, nullptr, kDamage},
@@ -256,6 +276,7 @@ int main(int argc, char** argv)
         case kRecordSum: layout.recordSum = static_cast<std::uint8_t>(Number(optarg, "--record-sum")); break;
         case kNoFrame: layout.adapterRecordsFrame = false; break;
         case kRecording: recordings.push_back(ParseRecording(optarg)); break;
+        case kOverwritten: recordings.push_back(ParseOverwritten(optarg)); break;
         case kFrames: framesFile = optarg; break;
         case kH264: framesFile = optarg; accessUnits = true; break;
         case kFrameSize: frameSize = static_cast<std::size_t>(Number(optarg, "--frame-size")); break;
