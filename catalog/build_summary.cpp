@@ -1,4 +1,5 @@
 #include "catalog/build_summary.h"
+#include "catalog/time_text.h"
 
 #include <fcntl.h>
 #include <sys/stat.h>
@@ -8,7 +9,6 @@
 #include <cerrno>
 #include <cstdio>
 #include <cstring>
-#include <ctime>
 
 namespace {
 
@@ -19,12 +19,7 @@ std::string Count(std::size_t n, const char* one, const char* many)
 
 std::string LocalMinute(std::uint32_t seconds)
 {
-    const std::time_t t = seconds;
-    std::tm tm{};
-    localtime_r(&t, &tm);
-    char text[32];
-    std::strftime(text, sizeof text, "%Y-%m-%d %H:%M", &tm);
-    return text;
+    return TimeText(seconds, "%Y-%m-%d %H:%M", Zone::kLocal);
 }
 
 std::string Size(long double bytes)

@@ -1,7 +1,8 @@
 #include "host/recording_timeline.h"
 
+#include "catalog/time_text.h"
+
 #include <algorithm>
-#include <ctime>
 
 RecordingTimeline::RecordingTimeline(CatalogReader& reader) : m_reader(reader)
 {
@@ -91,10 +92,5 @@ FrameTime RecordingTimeline::Locate(long long block, int entry)
 
 std::string RecordingTimeline::LocalText(std::uint32_t seconds)
 {
-    const std::time_t t = seconds;
-    std::tm tm{};
-    localtime_r(&t, &tm);
-    char text[48];
-    std::strftime(text, sizeof text, "%Y-%m-%d %H:%M:%S (local time)", &tm);
-    return text;
+    return TimeText(seconds, "%Y-%m-%d %H:%M:%S (local time)", Zone::kLocal);
 }

@@ -17,7 +17,12 @@ namespace fuzzdisk {
 constexpr std::uint64_t kMaxOffset = 1ull << 40;
 
 // Writes the image the extents describe to a sparse file of this process
-// (replacing the previous one) and returns its path.
+// (replacing the previous one) and returns its path. For an input of even
+// length every record it holds then has its XOR sum made right (superblock
+// headers, block tables, adapter slots, list entries and their mirror copies,
+// data block headers, index entries), so that mutated values get past the
+// sums into the code behind them; odd inputs keep their sums as mutated, so
+// that the damage paths stay covered. Fuzz builds only.
 std::string WriteImage(const std::uint8_t* data, std::size_t size);
 
 // The extents of a sparse file, as an input (for seeds).

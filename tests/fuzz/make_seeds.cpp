@@ -127,6 +127,29 @@ int main(int argc, char** argv)
              i.Damage(Target::PrimarySuperBlock);
              i.Damage(Target::BackupSuperBlock);
          }},
+        {"clip-h264",
+         [] { return Small(); },
+         [](DiskImage& i) {
+             const std::vector<std::vector<std::uint8_t>> units =
+                 dvrimage::AccessUnitsOfFile(MORVANE_SOURCE_DIR "/samples/clip.h264");
+             for (int r = 0; r < 2; ++r) {
+                 dvrimage::Recording recording = GeneratedRecording(r, r, r, 1000u + 100u * r, 1001u + 100u * r, 8);
+                 recording.blocks.assign(1, {});
+                 for (int k = 0; k < 25; ++k)
+                     recording.blocks[0].push_back({units[static_cast<std::size_t>(k)], 1});
+                 i.Add(recording);
+             }
+         },
+         None},
+        {"list-wrapped-over",
+         [] { return Small(); },
+         [](DiskImage& i) {
+             dvrimage::Recording old = GeneratedRecording(0, 0, 1, 100, 200, 8, 2, 16);
+             old.listed = false;
+             i.Add(old);
+             i.Add(GeneratedRecording(0, 2, 3, 300, 400, 8, 2, 16));
+         },
+         None},
         {"block-header", [] { return Small(); }, ThreeRecordings, [](DiskImage& i) { i.Damage(Target::BlockHeader, 0); }},
         {"index-entry", [] { return Small(); }, ThreeRecordings, [](DiskImage& i) { i.Damage(Target::IndexEntry, 0, 1); }},
     };

@@ -42,6 +42,7 @@ block_table_count=4
 offset_block_space=1048576
 super_offset=0
 super_offset_backup=524288
+image=raw
 superblock_copy=primary
 adapter_slot=4
 adapter_version=1

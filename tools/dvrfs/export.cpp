@@ -7,7 +7,6 @@
 #include <cerrno>
 #include <cmath>
 #include <cstdio>
-#include <ctime>
 #include <memory>
 #include <vector>
 
@@ -17,6 +16,7 @@ extern "C" {
 #include <libavutil/sha.h>
 }
 
+#include "catalog/time_text.h"
 #include "dvrfs/record_math.h"
 
 namespace dvrfstool {
@@ -359,12 +359,7 @@ const char* Extension(ExportFormat format)
 
 std::string IsoUtc(double seconds)
 {
-    const std::time_t t = static_cast<std::time_t>(seconds);
-    std::tm tm{};
-    gmtime_r(&t, &tm);
-    char text[32];
-    std::strftime(text, sizeof text, "%Y-%m-%dT%H:%M:%SZ", &tm);
-    return text;
+    return TimeText(static_cast<std::time_t>(seconds), "%Y-%m-%dT%H:%M:%SZ", Zone::kUtc);
 }
 
 ExportOutcome ExportRecording(CatalogReader& reader, const _HisiList_t& recording, const ExportRequest& request,

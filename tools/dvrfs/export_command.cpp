@@ -13,6 +13,7 @@
 #include <filesystem>
 #include <fstream>
 
+#include "catalog/time_text.h"
 #include "tools/dvrfs/command_line.h"
 #include "tools/dvrfs/export.h"
 #include "tools/dvrfs/recover.h"
@@ -43,12 +44,8 @@ bool ParseTime(const std::string& text, std::uint32_t* seconds)
 // "row3-20231115T021320Z.mp4"
 std::string FileName(int row, std::uint32_t start, dvrfstool::ExportFormat format)
 {
-    const std::time_t t = start;
-    std::tm tm{};
-    gmtime_r(&t, &tm);
-    char stamp[24];
-    std::strftime(stamp, sizeof stamp, "%Y%m%dT%H%M%SZ", &tm);
-    return "row" + std::to_string(row) + "-" + stamp + "." + dvrfstool::Extension(format);
+    return "row" + std::to_string(row) + "-" + TimeText(start, "%Y%m%dT%H%M%SZ", Zone::kUtc) + "." +
+           dvrfstool::Extension(format);
 }
 
 bool IsDirectory(const std::string& path)
