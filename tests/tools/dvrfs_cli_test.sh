@@ -72,7 +72,9 @@ check "info on a damaged primary superblock reads the backup" "superblock_copy=b
 "$mkdvrfs" --damage primary-super --damage backup-super "$work/bad.img" >/dev/null
 err=$("$dvrfs" info "$work/bad.img" 2>&1 >/dev/null)
 check "info on two damaged superblocks" 1 $?
-check "info says why" "dvrfs: $work/bad.img: not a recorder disk: the superblock is damaged (code 33)" "$err"
+check "info says why" "dvrfs: $work/bad.img: not a recorder disk (both superblocks damaged) (reader's code 33)" "$err"
+out=$("$dvrfs" info --json "$work/disk.img" | grep -o '"superblock_copy": "primary".*"end_time_utc": "2023-11-14T22:38:20Z"}')
+check "info --json: the same facts, the times also in ISO 8601" 0 $?
 "$mkdvrfs" --version 0 "$work/blank.img" >/dev/null
 err=$("$dvrfs" info "$work/blank.img" 2>&1 >/dev/null)
 check "info on an unconfigured disk" 1 $?
@@ -129,6 +131,8 @@ damaged: list entry 1 (mirror copy)
 damaged: data block 1 index entry 2
 damaged: data block 2 header
 summary: 140 records checked, 5 damaged, 1 repaired" "$out"
+out=$("$dvrfs" verify --json "$work/damaged.img")
+check "verify --json" '{"stage": "complete", "checked": 140, "damaged": 5, "repaired": 1, "findings": [{"kind": "damaged", "record": "backup superblock"}, {"kind": "damaged", "record": "adapter slot 1"}, {"kind": "repaired", "record": "list entry 0 (ring copy damaged, mirror copy used)"}, {"kind": "damaged", "record": "list entry 1 (mirror copy)"}, {"kind": "damaged", "record": "data block 1 index entry 2"}, {"kind": "damaged", "record": "data block 2 header"}]}' "$out"
 "$mkdvrfs" --damage backup-table "$work/table.img" >/dev/null
 out=$("$dvrfs" verify "$work/table.img")
 check "verify of a damaged backup table" 3 $?

@@ -80,10 +80,13 @@ int CheckOutput(const std::string& disk, const std::string& output, bool force)
 int BuildCatalog(CatalogReader& reader, const std::string& disk)
 {
     const CatalogBuild result = reader.BuildCatalog(wxString::FromUTF8(disk.c_str()));
-    if (result == CatalogBuild::kBuilt)
-        return kOk;
+    return result == CatalogBuild::kBuilt ? kOk : SayWhyNot(result, reader, disk);
+}
+
+int SayWhyNot(CatalogBuild stage, const CatalogReader& reader, const std::string& disk)
+{
     std::fflush(stdout);
-    std::fprintf(stderr, "dvrfs: %s: %s", disk.c_str(), DescribeBuild(result, reader, disk).c_str());
+    std::fprintf(stderr, "dvrfs: %s: %s", disk.c_str(), DescribeBuild(stage, reader, disk).c_str());
     if (reader.m_errorCode != kErrNone || reader.m_errorText[0] != '\0')
         std::fprintf(stderr, " (reader's code %d%s%s)", reader.m_errorCode, reader.m_errorText[0] ? ": " : "",
                      reader.m_errorText);

@@ -66,6 +66,10 @@ int CheckOutput(const std::string& disk, const std::string& output, bool force);
 // recorder disk, says why on standard error and returns kDiskUnreadable.
 int BuildCatalog(CatalogReader& reader, const std::string& disk);
 
+// Says on standard error, in plain words and then with the reader's code,
+// why a build that got as far as `stage` cannot go on; kDiskUnreadable.
+int SayWhyNot(CatalogBuild stage, const CatalogReader& reader, const std::string& disk);
+
 // The evidence commands: export, hash, recover.
 int ExportCommand(const CommandLine& line);
 int HashCommand(const std::string& disk);

@@ -33,9 +33,9 @@ Look at a recorder's disk (a device, a raw image, a split raw image by its
 recordings on. Options may stand before or after the operands.
 
 Commands:
-  info DISK [--dump]          the superblock and the current adapter
+  info DISK [--dump] [--json] the superblock and the current adapter
   list DISK [--json]          the recordings, as the playback panel lists them
-  verify DISK                 read every record once, report damage
+  verify DISK [--json]        read every record once, report damage
   extract DISK ROW -o FILE    the frames of a recording as the raw stream
   export DISK ROW... [-o FILE|DIR] [--format mp4|mkv|h264]
   export DISK --from TIME --to TIME [-o DIR]
@@ -52,10 +52,12 @@ blocks out; 5 an output could not be written.
 )";
 
 const std::map<std::string, std::string> kCommandHelp = {
-    {"info", R"(Usage: dvrfs info DISK [--dump]
-The superblock and the current adapter, one key=value a line;
-superblock_copy says whether the primary or the backup copy was read.
---dump adds the reader's adapter dump.
+    {"info", R"(Usage: dvrfs info DISK [--dump] [--json]
+The superblock and the current adapter, one key=value a line (times in
+seconds since 1970, UTC); image says what kind of image was read (and, for
+an E01, what it says of its acquisition); superblock_copy whether the
+primary or the backup copy was read. --dump adds the reader's adapter dump;
+--json prints one object instead, the times also as ISO 8601 UTC texts.
 )"},
     {"list", R"(Usage: dvrfs list DISK [--json]
 The recordings, as the playback panel lists them: ROW, IDX, START, END
@@ -63,11 +65,12 @@ The recordings, as the playback panel lists them: ROW, IDX, START, END
 object. Entries damaged in both copies are skipped and named on standard
 error (and under "skipped" in the JSON).
 )"},
-    {"verify", R"(Usage: dvrfs verify DISK
+    {"verify", R"(Usage: dvrfs verify DISK [--json]
 Reads every record once (both superblock copies, the 120 adapter slots, the
 list entries of the span in the ring and the mirror, each claimed data
 block's header and index) and reports each damaged or repaired one, then a
-summary. Exit status 3 when it found damage.
+summary; --json prints one object with the stage reached, the counts and
+each finding. Exit status 3 when it found damage.
 )"},
     {"extract", R"(Usage: dvrfs extract DISK ROW -o FILE [--force]
 Writes the frames of recording ROW (as listed) to FILE, in order, as the raw
@@ -139,55 +142,70 @@ int CannotRead(const char* disk, const char* what, const DvrDiskReader& reader)
     return kDiskUnreadable;
 }
 
-int NotConfigured(const char* disk)
+struct Fact {
+    std::string key;
+    std::string value;
+    bool text;  // a string in JSON, else a number
+};
+
+template <typename Number>
+Fact Numeric(const char* key, Number value)
 {
-    std::fflush(stdout);
-    std::fprintf(stderr, "dvrfs: %s: no recorder was ever configured on this disk\n", disk);
-    return kDiskUnreadable;
+    return {key, std::to_string(value), false};
 }
 
-int Info(const char* disk, bool dump)
+void PrintFacts(const std::vector<Fact>& facts, bool json);
+
+int Info(const char* disk, bool dump, bool json)
 {
     CatalogReader reader;
     if (reader.OpenDVRFS(wxString::FromUTF8(disk)) <= 0)
-        return CannotRead(disk, "not a recorder disk", reader);
+        return SayWhyNot(CatalogBuild::kNotOpened, reader, disk);
     const _H264SuperBlock_t& super = reader.m_volume->superBlock;
-    std::printf("magic=0x%04X\n", super.Magic);
-    std::printf("header_size=%u\n", super.HeaderSize);
-    std::printf("block_size=%d\n", super.BlockSize);
-    std::printf("block_count=%d\n", super.BlockCount);
-    std::printf("block_table_count=%u\n", super.BlockTableCount);
-    std::printf("offset_block_space=%llu\n", static_cast<unsigned long long>(super.OffsetBlockSpace));
-    std::printf("super_offset=%llu\n", static_cast<unsigned long long>(super.SuperOffset));
-    std::printf("super_offset_backup=%llu\n", static_cast<unsigned long long>(super.SuperOffsetBackup));
-    if (reader.m_imageSource) {
-        std::printf("image=%s\n", reader.m_imageSource->Kind().c_str());
+    char magic[16];
+    std::snprintf(magic, sizeof magic, "0x%04X", super.Magic);
+    std::vector<Fact> facts = {
+        {"magic", magic, true},
+        Numeric("header_size", super.HeaderSize),
+        Numeric("block_size", super.BlockSize),
+        Numeric("block_count", super.BlockCount),
+        Numeric("block_table_count", super.BlockTableCount),
+        Numeric("offset_block_space", static_cast<unsigned long long>(super.OffsetBlockSpace)),
+        Numeric("super_offset", static_cast<unsigned long long>(super.SuperOffset)),
+        Numeric("super_offset_backup", static_cast<unsigned long long>(super.SuperOffsetBackup)),
+        {"image", reader.m_imageSource ? reader.m_imageSource->Kind() : "raw", true},
+    };
+    if (reader.m_imageSource)
         for (const auto& [key, value] : reader.m_imageSource->Facts())
-            std::printf("image_%s=%s\n", key.c_str(), value.c_str());
-    } else {
-        std::printf("image=raw\n");
-    }
+            facts.push_back({"image_" + key, value, true});
     const bool onBackup = reader.m_volume->copyInUse != SuperBlockCopy::kPrimary;
-    std::printf("superblock_copy=%s\n", onBackup ? "backup" : "primary");
+    facts.push_back({"superblock_copy", onBackup ? "backup" : "primary", true});
 
+    CatalogBuild stage = CatalogBuild::kBuilt;
     if (reader.Checkconfig() <= 0)
-        return NotConfigured(disk);
-    if (reader.BlockOpe(reader.m_diskFile, 2, nullptr, 0, 0) < 0 && !reader.m_volume->adapter)
-        return CannotRead(disk, "no current state record", reader);
+        stage = CatalogBuild::kNotConfigured;
+    else if (reader.BlockOpe(reader.m_diskFile, 2, nullptr, 0, 0) < 0 && !reader.m_volume->adapter)
+        stage = CatalogBuild::kNoAdapter;
+    if (stage != CatalogBuild::kBuilt) {
+        PrintFacts(facts, json);
+        return SayWhyNot(stage, reader, disk);
+    }
     const _HisiAdapter_t& adapter = *reader.m_volume->adapter;
-    std::printf("adapter_slot=%d\n", adapter.Idx);
-    std::printf("adapter_version=%d\n", adapter.Version);
-    std::printf("list_max=%d\n", adapter.ListMax);
-    std::printf("data_block_max=%d\n", adapter.DataBlockMax);
-    std::printf("first_list=%d\n", adapter.FirstList.Idx);
-    std::printf("last_list=%d\n", adapter.LastList.Idx);
-    std::printf("record_sum=%u\n", adapter.RecordSum);
-    std::printf("start_time=%u\n", adapter.StartTime);
-    std::printf("end_time=%u\n", adapter.EndTime);
+    for (const Fact& fact : {Numeric("adapter_slot", adapter.Idx), Numeric("adapter_version", adapter.Version),
+                             Numeric("list_max", adapter.ListMax), Numeric("data_block_max", adapter.DataBlockMax),
+                             Numeric("first_list", adapter.FirstList.Idx), Numeric("last_list", adapter.LastList.Idx),
+                             Numeric("record_sum", static_cast<unsigned>(adapter.RecordSum)),
+                             Numeric("start_time", adapter.StartTime), Numeric("end_time", adapter.EndTime)})
+        facts.push_back(fact);
     for (char selector : {1, 3, 17, 19, 33, 35, 49, 50})
-        std::printf("info_%d=%lld\n", selector, static_cast<long long>(reader.GetInfo(selector)));
-    std::fflush(stdout);
-    if (dump)
+        facts.push_back(Numeric(("info_" + std::to_string(selector)).c_str(),
+                                static_cast<long long>(reader.GetInfo(selector))));
+    if (json) {  // the times also as text, for whoever reads the JSON
+        facts.push_back({"start_time_utc", dvrfstool::IsoUtc(adapter.StartTime), true});
+        facts.push_back({"end_time_utc", dvrfstool::IsoUtc(adapter.EndTime), true});
+    }
+    PrintFacts(facts, json);
+    if (dump && !json)
         reader.BlockOpe(reader.m_diskFile, 5, nullptr, 0, 0);
     return kOk;
 }
@@ -209,6 +227,22 @@ std::string JsonString(const char* text)
         }
     }
     return out + "\"";
+}
+
+// key=value a line, or one JSON object.
+void PrintFacts(const std::vector<Fact>& facts, bool json)
+{
+    if (!json) {
+        for (const Fact& fact : facts)
+            std::printf("%s=%s\n", fact.key.c_str(), fact.value.c_str());
+    } else {
+        std::printf("{");
+        for (std::size_t i = 0; i < facts.size(); ++i)
+            std::printf("%s\"%s\": %s", i ? ", " : "", facts[i].key.c_str(),
+                        facts[i].text ? JsonString(facts[i].value.c_str()).c_str() : facts[i].value.c_str());
+        std::printf("}\n");
+    }
+    std::fflush(stdout);
 }
 
 // Says on standard error which entries of the disk's list have no row.
@@ -259,17 +293,36 @@ int List(const char* disk, bool json)
     return kOk;
 }
 
-int Verify(const char* disk)
+int Verify(const char* disk, bool json)
 {
     CatalogReader reader;
-    const dvrfstool::VerifyResult result = dvrfstool::VerifyDisk(
-        reader, wxString::FromUTF8(disk), [](const std::string& line) { std::printf("%s\n", line.c_str()); });
-    std::printf("summary: %lld records checked, %lld damaged, %lld repaired\n", result.checked, result.damaged,
-                result.repaired);
+    std::vector<std::string> findings;
+    const dvrfstool::VerifyResult result =
+        dvrfstool::VerifyDisk(reader, wxString::FromUTF8(disk), [json, &findings](const std::string& line) {
+            if (json)
+                findings.push_back(line);
+            else
+                std::printf("%s\n", line.c_str());
+        });
+    static const char* const kStages[] = {"not opened", "not configured", "no adapter", "complete"};
+    if (json) {
+        std::printf("{\"stage\": \"%s\", \"checked\": %lld, \"damaged\": %lld, \"repaired\": %lld, \"findings\": [",
+                    kStages[static_cast<int>(result.stage)], result.checked, result.damaged, result.repaired);
+        for (std::size_t i = 0; i < findings.size(); ++i) {
+            const std::size_t colon = findings[i].find(": ");
+            std::printf("%s{\"kind\": %s, \"record\": %s}", i ? ", " : "",
+                        JsonString(findings[i].substr(0, colon).c_str()).c_str(),
+                        JsonString(findings[i].substr(colon + 2).c_str()).c_str());
+        }
+        std::printf("]}\n");
+    } else {
+        std::printf("summary: %lld records checked, %lld damaged, %lld repaired\n", result.checked, result.damaged,
+                    result.repaired);
+    }
     switch (result.stage) {
-    case dvrfstool::VerifyStage::kNotOpened: return CannotRead(disk, "not a recorder disk", reader);
-    case dvrfstool::VerifyStage::kNotConfigured: return NotConfigured(disk);
-    case dvrfstool::VerifyStage::kNoAdapter: return CannotRead(disk, "no current state record", reader);
+    case dvrfstool::VerifyStage::kNotOpened: return SayWhyNot(CatalogBuild::kNotOpened, reader, disk);
+    case dvrfstool::VerifyStage::kNotConfigured: return SayWhyNot(CatalogBuild::kNotConfigured, reader, disk);
+    case dvrfstool::VerifyStage::kNoAdapter: return SayWhyNot(CatalogBuild::kNoAdapter, reader, disk);
     case dvrfstool::VerifyStage::kComplete: break;
     }
     return result.damaged + result.repaired > 0 ? kDamageFound : kOk;
@@ -381,7 +434,7 @@ int main(int argc, char** argv)
         return kOk;
     }
     static const std::map<std::string, std::set<std::string>> kFlags = {
-        {"info", {"--dump"}}, {"list", {"--json"}}, {"verify", {}},
+        {"info", {"--dump", "--json"}}, {"list", {"--json"}}, {"verify", {"--json"}},
         {"extract", {"--force"}}, {"export", {"--force"}}, {"hash", {}}, {"recover", {"--json"}},
     };
     for (const std::string& flag : line.flags)
@@ -392,11 +445,11 @@ int main(int argc, char** argv)
     const std::string& disk = line.operands[0];
     const std::size_t operands = line.operands.size();
     if (line.command == "info" && operands == 1)
-        return Info(disk.c_str(), line.Has("--dump"));
+        return Info(disk.c_str(), line.Has("--dump"), line.Has("--json"));
     if (line.command == "list" && operands == 1)
         return List(disk.c_str(), line.Has("--json"));
     if (line.command == "verify" && operands == 1)
-        return Verify(disk.c_str());
+        return Verify(disk.c_str(), line.Has("--json"));
     if (line.command == "extract" && operands == 2 && line.Value("-o") && !line.Value("--blocks"))
         return Extract(disk.c_str(), line.operands[1].c_str(), line.Value("-o")->c_str(), line.Has("--force"));
     if (line.command == "extract" && operands == 1 && line.Value("-o") && line.Value("--blocks"))
