@@ -94,10 +94,10 @@ check "list output" "$(printf '0\t62\t0\t86399\t1970/01/01 00:00:00-23:59:59
 1\t63\t1700000000\t1700003723\t2023/11/14 22:13:20-23:15:23
 2\t0\t951782400\t951868799\t2000/02/29 00:00:00-23:59:59')" "$out"
 out=$("$dvrfs" list "$work/list.img" --json)
-check "list --json" '{"span_count": 3, "recordings": [{"row": 0, "idx": 62, "start": 0, "end": 86399, "date": "1970/01/01", "time": "00:00:00-23:59:59"}, {"row": 1, "idx": 63, "start": 1700000000, "end": 1700003723, "date": "2023/11/14", "time": "22:13:20-23:15:23"}, {"row": 2, "idx": 0, "start": 951782400, "end": 951868799, "date": "2000/02/29", "time": "00:00:00-23:59:59"}], "skipped": [], "error": {"code": 50, "text": "FUNCTION[1463]"}}' "$out"
+check "list --json" '{"span_count": 3, "recordings": [{"row": 0, "idx": 62, "start": 0, "end": 86399, "date": "1970/01/01", "time": "00:00:00-23:59:59", "start_utc": "1970-01-01T00:00:00Z", "end_utc": "1970-01-01T23:59:59Z"}, {"row": 1, "idx": 63, "start": 1700000000, "end": 1700003723, "date": "2023/11/14", "time": "22:13:20-23:15:23", "start_utc": "2023-11-14T22:13:20Z", "end_utc": "2023-11-14T23:15:23Z"}, {"row": 2, "idx": 0, "start": 951782400, "end": 951868799, "date": "2000/02/29", "time": "00:00:00-23:59:59", "start_utc": "2000-02-29T00:00:00Z", "end_utc": "2000-02-29T23:59:59Z"}], "skipped": [], "error": {"code": 50, "text": "FUNCTION[1463]"}}' "$out"
 "$mkdvrfs" --recording 5:0:0:100:200 "$work/one.img" >/dev/null
 out=$("$dvrfs" list "$work/one.img" --json)
-check "list --json of an untroubled disk" '{"span_count": 1, "recordings": [{"row": 0, "idx": 5, "start": 100, "end": 200, "date": "1970/01/01", "time": "00:01:40-00:03:20"}], "skipped": [], "error": null}' "$out"
+check "list --json of an untroubled disk" '{"span_count": 1, "recordings": [{"row": 0, "idx": 5, "start": 100, "end": 200, "date": "1970/01/01", "time": "00:01:40-00:03:20", "start_utc": "1970-01-01T00:01:40Z", "end_utc": "1970-01-01T00:03:20Z"}], "skipped": [], "error": null}' "$out"
 "$mkdvrfs" --recording 0:0:0:100:200 --recording 1:1:1:300:400 --recording 2:2:2:500:600 \
   --damage list:1 --damage mirror:1 "$work/cut.img" >/dev/null
 out=$("$dvrfs" list "$work/cut.img" 2>"$work/skipped")

@@ -62,7 +62,7 @@ primary or the backup copy was read. --dump adds the reader's adapter dump;
     {"list", R"(Usage: dvrfs list DISK [--json]
 The recordings, as the playback panel lists them: ROW, IDX, START, END
 (seconds since 1970, UTC), DATE TIME (UTC), tab-separated; --json prints one
-object. Entries damaged in both copies are skipped and named on standard
+object, the times also as ISO 8601 UTC texts (start_utc, end_utc). Entries damaged in both copies are skipped and named on standard
 error (and under "skipped" in the JSON).
 )"},
     {"verify", R"(Usage: dvrfs verify DISK [--json]
@@ -277,10 +277,12 @@ int List(const char* disk, bool json)
     std::printf("{\"span_count\": %u, \"recordings\": [", catalog.SpanCount);
     for (int row = 0; row < reader.m_recordCount; ++row) {
         const CatalogEntry& e = catalog.Entries[row];
-        std::printf("%s{\"row\": %d, \"idx\": %d, \"start\": %u, \"end\": %u, \"date\": %s, \"time\": %s}",
-                    row ? ", " : "", row, e.Idx, static_cast<std::uint32_t>(e.StartTime),
-                    static_cast<std::uint32_t>(e.EndTime), JsonString(e.DateText).c_str(),
-                    JsonString(e.TimeText).c_str());
+        const std::uint32_t start = static_cast<std::uint32_t>(e.StartTime);
+        const std::uint32_t end = static_cast<std::uint32_t>(e.EndTime);
+        std::printf("%s{\"row\": %d, \"idx\": %d, \"start\": %u, \"end\": %u, \"date\": %s, \"time\": %s, "
+                    "\"start_utc\": \"%s\", \"end_utc\": \"%s\"}",
+                    row ? ", " : "", row, e.Idx, start, end, JsonString(e.DateText).c_str(),
+                    JsonString(e.TimeText).c_str(), dvrfstool::IsoUtc(start).c_str(), dvrfstool::IsoUtc(end).c_str());
     }
     std::printf("], \"skipped\": [");
     for (std::size_t i = 0; i < reader.m_skippedPositions.size(); ++i)
