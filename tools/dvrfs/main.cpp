@@ -1,12 +1,12 @@
 // dvrfs: looks at a recorder's disk without the host application: what its
 // superblock and adapter say, the recordings on it, whether its records are
-// sound, and a recording taken off it as an elementary stream.
+// sound, a recording taken off it as an elementary stream; and, through
+// export_command.cpp, recordings handed on as files, the disk's hash and the
+// blocks its index lost.
 #include <fcntl.h>
-#include <sys/stat.h>
 #include <unistd.h>
 
 #include <cerrno>
-#include <chrono>
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
