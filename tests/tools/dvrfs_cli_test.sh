@@ -212,6 +212,13 @@ check "export -o - writes an MP4 to standard output" 0 $?
 out=$("$dvrfs" export "$work/clip.img" --from 1700000001 --to 2023-11-14T23:13:21Z -o "$work/range/" 2>/dev/null | grep -c '^sha256')
 check "export of a time range: each recording that overlaps it" 2 "$out"
 
+# --- report
+"$dvrfs" report "$work/clip.img" -o "$work/report" >/dev/null
+check "report: an HTML page with a picture of each recording" 2 "$(grep -o '<img alt="row [0-9]*" src="data:image/png;base64,' "$work/report/report.html" | wc -l)"
+check "report: the JSON lists the rows list --json lists" "$("$dvrfs" list --json "$work/clip.img" | grep -o '"row": [0-9]*, "idx": [0-9]*')" \
+  "$(grep -o '"row": [0-9]*, "idx": [0-9]*' "$work/report/report.json")"
+check "report: the CSV has a line a recording" 3 "$(wc -l < "$work/report/report.csv")"
+
 # --- hash
 check "hash is the disk's SHA-256" "$(sha256sum "$work/one.img")" "$("$dvrfs" hash "$work/one.img")"
 

@@ -14,6 +14,7 @@ extern "C" {
 #include <libavcodec/avcodec.h>
 #include <libavformat/avformat.h>
 #include <libavutil/sha.h>
+#include <libswscale/swscale.h>
 }
 
 #include "catalog/time_text.h"
@@ -42,13 +43,6 @@ void ForEachUnit(const unsigned char* data, std::size_t size, Visit visit)
         visit(data[start + (data[start + 2] == 1 ? 3 : 4)] & 0x1F, data + start, size - start);
 }
 
-bool IsKeyFrame(const unsigned char* data, std::size_t size)
-{
-    bool key = false;
-    ForEachUnit(data, size, [&key](int type, const unsigned char*, std::size_t) { key = key || type == 5; });
-    return key;
-}
-
 // The sequence and picture parameter sets of an access unit, with their
 // start codes: what the container carries as the stream's set-up.
 std::vector<std::uint8_t> ParameterSets(const unsigned char* data, std::size_t size)
@@ -61,14 +55,26 @@ std::vector<std::uint8_t> ParameterSets(const unsigned char* data, std::size_t s
     return sets;
 }
 
+}  // namespace
+
+bool IsKeyFrame(const unsigned char* data, std::size_t size)
+{
+    bool key = false;
+    ForEachUnit(data, size, [&key](int type, const unsigned char*, std::size_t) { key = key || type == 5; });
+    return key;
+}
+
+namespace {
+
 struct StreamFacts {
     int width = 0;
     int height = 0;
     AVRational framerate = {0, 1};  // from the stream's timing information, 0 when it carries none
 };
 
-// Decodes a frame that starts a stream, for its size and its timing.
-bool Probe(const unsigned char* data, std::size_t size, StreamFacts* facts)
+// Decodes a frame that starts a stream and hands its picture on.
+template <typename Use>
+bool DecodeFirstPicture(const unsigned char* data, std::size_t size, Use use)
 {
     const AVCodec* codec = avcodec_find_decoder(AV_CODEC_ID_H264);
     AVCodecContext* context = codec ? avcodec_alloc_context3(codec) : nullptr;
@@ -83,16 +89,57 @@ bool Probe(const unsigned char* data, std::size_t size, StreamFacts* facts)
         packet->size = static_cast<int>(size);
         if (avcodec_open2(context, codec, nullptr) == 0 && avcodec_send_packet(context, packet) == 0) {
             avcodec_send_packet(context, nullptr);
-            ok = avcodec_receive_frame(context, frame) == 0 && context->width > 0 && context->height > 0;
-            facts->width = context->width;
-            facts->height = context->height;
-            facts->framerate = context->framerate;
+            ok = avcodec_receive_frame(context, frame) == 0 && context->width > 0 && context->height > 0 &&
+                 use(context, frame);
         }
     }
     av_frame_free(&frame);
     av_packet_free(&packet);
     avcodec_free_context(&context);
     return ok;
+}
+
+// Decodes a frame that starts a stream, for its size and its timing.
+bool Probe(const unsigned char* data, std::size_t size, StreamFacts* facts)
+{
+    return DecodeFirstPicture(data, size, [facts](AVCodecContext* context, AVFrame*) {
+        facts->width = context->width;
+        facts->height = context->height;
+        facts->framerate = context->framerate;
+        return true;
+    });
+}
+
+// A decoded picture scaled to `width` (keeping its shape) and encoded as PNG.
+std::string EncodePng(const AVFrame* frame, int width)
+{
+    const int height = std::max(1, frame->height * width / std::max(frame->width, 1));
+    SwsContext* scaler = sws_getContext(frame->width, frame->height, static_cast<AVPixelFormat>(frame->format), width,
+                                        height, AV_PIX_FMT_RGB24, SWS_BILINEAR, nullptr, nullptr, nullptr);
+    const AVCodec* codec = avcodec_find_encoder(AV_CODEC_ID_PNG);
+    AVCodecContext* encoder = codec ? avcodec_alloc_context3(codec) : nullptr;
+    AVFrame* rgb = av_frame_alloc();
+    AVPacket* packet = av_packet_alloc();
+    std::string png;
+    if (scaler && encoder && rgb && packet) {
+        encoder->width = width;
+        encoder->height = height;
+        encoder->pix_fmt = AV_PIX_FMT_RGB24;
+        encoder->time_base = {1, 25};
+        rgb->format = AV_PIX_FMT_RGB24;
+        rgb->width = width;
+        rgb->height = height;
+        if (avcodec_open2(encoder, codec, nullptr) == 0 && av_frame_get_buffer(rgb, 0) == 0) {
+            sws_scale(scaler, frame->data, frame->linesize, 0, frame->height, rgb->data, rgb->linesize);
+            if (avcodec_send_frame(encoder, rgb) == 0 && avcodec_receive_packet(encoder, packet) == 0)
+                png.assign(reinterpret_cast<const char*>(packet->data), static_cast<std::size_t>(packet->size));
+        }
+    }
+    av_packet_free(&packet);
+    av_frame_free(&rgb);
+    avcodec_free_context(&encoder);
+    sws_freeContext(scaler);
+    return png;
 }
 
 // The frames the recording's block headers count: its length in frames,
@@ -333,6 +380,17 @@ private:
 };
 
 }  // namespace
+
+std::string Thumbnail(const std::string& accessUnit, int width)
+{
+    std::string png;
+    DecodeFirstPicture(reinterpret_cast<const unsigned char*>(accessUnit.data()), accessUnit.size(),
+                       [&png, width](AVCodecContext*, AVFrame* frame) {
+                           png = EncodePng(frame, width);
+                           return !png.empty();
+                       });
+    return png;
+}
 
 bool ParseExportFormat(const std::string& name, ExportFormat* format)
 {

@@ -46,7 +46,14 @@ struct ExportOutcome {
 ExportOutcome ExportRecording(CatalogReader& reader, const _HisiList_t& recording, const ExportRequest& request,
                               const std::function<void(double)>& progress = {});
 
-// The time of a frame place of an exported recording, as "2023-11-14T22:13:20Z".
+// Whether an H.264 access unit holds an IDR slice (a frame that needs no other).
+bool IsKeyFrame(const unsigned char* data, std::size_t size);
+
+// A frame that starts a stream, decoded and scaled to `width` pixels (its
+// shape kept), as a PNG picture; empty when it does not decode.
+std::string Thumbnail(const std::string& accessUnit, int width);
+
+// Seconds since 1970 as "2023-11-14T22:13:20Z".
 std::string IsoUtc(double seconds);
 
 // The SHA-256 of a whole file or device, read once from start to end, as 64

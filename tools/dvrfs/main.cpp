@@ -10,6 +10,7 @@
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
+#include <filesystem>
 #include <map>
 #include <set>
 #include <string>
@@ -20,6 +21,7 @@
 #include "tools/dvrfs/disk_check.h"
 #include "tools/dvrfs/export.h"
 #include "tools/dvrfs/recover.h"
+#include "tools/dvrfs/report.h"
 
 namespace {
 
@@ -43,6 +45,9 @@ Commands:
                               each with its SHA-256
   hash DISK                   the SHA-256 of the whole disk or image
   recover DISK [--json]       runs of data blocks no listed recording covers
+  report DISK [-o DIR] [--hash]
+                              a case report: JSON, CSV and an HTML page with
+                              a picture of each recording
 
 'dvrfs COMMAND --help' says more of each; 'dvrfs --version' names this one.
 
@@ -100,6 +105,15 @@ damaged. Each run: its blocks, its frames, and the time it must lie in
 (after the end of the listed recording before it, before the start of the
 one after, UTC). 'extract --blocks FIRST:LAST' and 'export --blocks
 FIRST:LAST' take such a run.
+)"},
+    {"report", R"(Usage: dvrfs report DISK [-o DIR] [--hash]
+A case report on the disk in DIR (default: the current folder):
+report.json, report.csv and report.html, a page a browser opens by itself:
+the tool, the disk, when the report was made, what the disk holds, the
+verification with each damaged or repaired record, and the catalogue (row,
+list index, start, end and duration in UTC and local time, repaired
+entries, skipped entries) with a picture of each recording's first key
+frame (also beside it as report-rowN.png). --hash adds the disk's SHA-256.
 )"},
     {"hash", R"(Usage: dvrfs hash DISK
 The SHA-256 of the whole disk or image, read once from start to end, in the
@@ -412,6 +426,21 @@ int Extract(const char* disk, const char* rowText, const char* output, bool forc
     return kOk;
 }
 
+int Report(const std::string& disk, const std::string& folder, bool hash)
+{
+    std::error_code error;
+    std::filesystem::create_directories(folder, error);
+    dvrfstool::ReportRequest request{disk, folder, kVersion, hash};
+    request.toolVersion.pop_back();  // the version line's newline
+    const std::string why = dvrfstool::WriteReport(request);
+    if (!why.empty()) {
+        std::fprintf(stderr, "dvrfs: %s: %s\n", disk.c_str(), why.c_str());
+        return kDiskUnreadable;
+    }
+    std::printf("%s/report.html, report.json and report.csv written\n", folder.c_str());
+    return kOk;
+}
+
 }  // namespace
 
 int main(int argc, char** argv)
@@ -437,7 +466,7 @@ int main(int argc, char** argv)
     }
     static const std::map<std::string, std::set<std::string>> kFlags = {
         {"info", {"--dump", "--json"}}, {"list", {"--json"}}, {"verify", {"--json"}},
-        {"extract", {"--force"}}, {"export", {"--force"}}, {"hash", {}}, {"recover", {"--json"}},
+        {"extract", {"--force"}}, {"export", {"--force"}}, {"hash", {}}, {"recover", {"--json"}}, {"report", {"--hash"}},
     };
     for (const std::string& flag : line.flags)
         if (!kFlags.at(line.command).count(flag))
@@ -462,5 +491,7 @@ int main(int argc, char** argv)
         return HashCommand(disk);
     if (line.command == "recover" && operands == 1)
         return RecoverCommand(disk, line.Has("--json"));
+    if (line.command == "report" && operands == 1)
+        return Report(disk, line.Value("-o") ? *line.Value("-o") : ".", line.Has("--hash"));
     return UsageError("cannot make sense of the arguments of '" + line.command + "'");
 }
