@@ -20,6 +20,7 @@
 #include "tools/dvrfs/command_line.h"
 #include "tools/dvrfs/disk_check.h"
 #include "tools/dvrfs/export.h"
+#include "tools/dvrfs/json_text.h"
 #include "tools/dvrfs/recover.h"
 #include "tools/dvrfs/report.h"
 
@@ -224,25 +225,6 @@ int Info(const char* disk, bool dump, bool json)
     return kOk;
 }
 
-std::string JsonString(const char* text)
-{
-    std::string out = "\"";
-    for (const char* p = text; *p; ++p) {
-        const unsigned char c = static_cast<unsigned char>(*p);
-        if (c == '"' || c == '\\') {
-            out += '\\';
-            out += static_cast<char>(c);
-        } else if (c < 0x20 || c >= 0x7F) {
-            char escaped[8];
-            std::snprintf(escaped, sizeof escaped, "\\u%04x", c);
-            out += escaped;
-        } else {
-            out += static_cast<char>(c);
-        }
-    }
-    return out + "\"";
-}
-
 // key=value a line, or one JSON object.
 void PrintFacts(const std::vector<Fact>& facts, bool json)
 {
@@ -253,7 +235,7 @@ void PrintFacts(const std::vector<Fact>& facts, bool json)
         std::printf("{");
         for (std::size_t i = 0; i < facts.size(); ++i)
             std::printf("%s\"%s\": %s", i ? ", " : "", facts[i].key.c_str(),
-                        facts[i].text ? JsonString(facts[i].value.c_str()).c_str() : facts[i].value.c_str());
+                        facts[i].text ? JsonText(facts[i].value).c_str() : facts[i].value.c_str());
         std::printf("}\n");
     }
     std::fflush(stdout);
@@ -295,8 +277,8 @@ int List(const char* disk, bool json)
         const std::uint32_t end = static_cast<std::uint32_t>(e.EndTime);
         std::printf("%s{\"row\": %d, \"idx\": %d, \"start\": %u, \"end\": %u, \"date\": %s, \"time\": %s, "
                     "\"start_utc\": \"%s\", \"end_utc\": \"%s\"}",
-                    row ? ", " : "", row, e.Idx, start, end, JsonString(e.DateText).c_str(),
-                    JsonString(e.TimeText).c_str(), dvrfstool::IsoUtc(start).c_str(), dvrfstool::IsoUtc(end).c_str());
+                    row ? ", " : "", row, e.Idx, start, end, JsonText(e.DateText).c_str(),
+                    JsonText(e.TimeText).c_str(), dvrfstool::IsoUtc(start).c_str(), dvrfstool::IsoUtc(end).c_str());
     }
     std::printf("], \"skipped\": [");
     for (std::size_t i = 0; i < reader.m_skippedPositions.size(); ++i)
@@ -305,7 +287,7 @@ int List(const char* disk, bool json)
         std::printf("], \"error\": null}\n");
     else
         std::printf("], \"error\": {\"code\": %d, \"text\": %s}}\n", reader.m_errorCode,
-                    JsonString(reader.m_errorText).c_str());
+                    JsonText(reader.m_errorText).c_str());
     return kOk;
 }
 
@@ -327,8 +309,8 @@ int Verify(const char* disk, bool json)
         for (std::size_t i = 0; i < findings.size(); ++i) {
             const std::size_t colon = findings[i].find(": ");
             std::printf("%s{\"kind\": %s, \"record\": %s}", i ? ", " : "",
-                        JsonString(findings[i].substr(0, colon).c_str()).c_str(),
-                        JsonString(findings[i].substr(colon + 2).c_str()).c_str());
+                        JsonText(findings[i].substr(0, colon)).c_str(),
+                        JsonText(findings[i].substr(colon + 2)).c_str());
         }
         std::printf("]}\n");
     } else {

@@ -15,6 +15,7 @@
 #include "catalog/time_text.h"
 #include "tools/dvrfs/disk_check.h"
 #include "tools/dvrfs/export.h"
+#include "tools/dvrfs/json_text.h"
 
 namespace dvrfstool {
 namespace {
@@ -31,24 +32,6 @@ struct ReportRow {
     std::string keyFrame;   // the first key frame's access unit
     std::string thumbnail;  // PNG
 };
-
-std::string Json(const std::string& text)
-{
-    std::string out = "\"";
-    for (const unsigned char c : text) {
-        if (c == '"' || c == '\\') {
-            out += '\\';
-            out += static_cast<char>(c);
-        } else if (c < 0x20) {
-            char escaped[8];
-            std::snprintf(escaped, sizeof escaped, "\\u%04x", c);
-            out += escaped;
-        } else {
-            out += static_cast<char>(c);
-        }
-    }
-    return out + "\"";
-}
 
 std::string Html(const std::string& text)
 {
@@ -136,19 +119,19 @@ Findings Verify(const std::string& disk)
     return findings;
 }
 
-void WriteJson(const std::string& path, const ReportRequest& request, const std::string& made,
+void WriteJsonText(const std::string& path, const ReportRequest& request, const std::string& made,
                const std::string& summary, const std::string& digest, const Findings& findings,
                const std::vector<ReportRow>& rows, const std::vector<std::int32_t>& skipped)
 {
     std::ofstream out(path);
-    out << "{\"tool\": " << Json(request.toolVersion) << ", \"disk\": " << Json(request.disk)
-        << ", \"made_utc\": " << Json(made) << ", \"summary\": " << Json(summary);
+    out << "{\"tool\": " << JsonText(request.toolVersion) << ", \"disk\": " << JsonText(request.disk)
+        << ", \"made_utc\": " << JsonText(made) << ", \"summary\": " << JsonText(summary);
     if (!digest.empty())
-        out << ", \"sha256\": " << Json(digest);
+        out << ", \"sha256\": " << JsonText(digest);
     out << ", \"verify\": {\"checked\": " << findings.result.checked << ", \"damaged\": " << findings.result.damaged
         << ", \"repaired\": " << findings.result.repaired << ", \"findings\": [";
     for (std::size_t i = 0; i < findings.lines.size(); ++i)
-        out << (i ? ", " : "") << Json(findings.lines[i]);
+        out << (i ? ", " : "") << JsonText(findings.lines[i]);
     out << "]}, \"skipped\": [";
     for (std::size_t i = 0; i < skipped.size(); ++i)
         out << (i ? ", " : "") << skipped[i];
@@ -156,12 +139,12 @@ void WriteJson(const std::string& path, const ReportRequest& request, const std:
     for (std::size_t i = 0; i < rows.size(); ++i) {
         const ReportRow& r = rows[i];
         out << (i ? ", " : "") << "{\"row\": " << r.row << ", \"idx\": " << r.idx << ", \"start\": " << r.start
-            << ", \"end\": " << r.end << ", \"start_utc\": " << Json(IsoUtc(r.start))
-            << ", \"end_utc\": " << Json(IsoUtc(r.end)) << ", \"start_local\": " << Json(Local(r.start))
-            << ", \"end_local\": " << Json(Local(r.end))
+            << ", \"end\": " << r.end << ", \"start_utc\": " << JsonText(IsoUtc(r.start))
+            << ", \"end_utc\": " << JsonText(IsoUtc(r.end)) << ", \"start_local\": " << JsonText(Local(r.start))
+            << ", \"end_local\": " << JsonText(Local(r.end))
             << ", \"seconds\": " << (r.end >= r.start ? r.end - r.start : 0)
             << ", \"repaired\": " << (r.repaired ? "true" : "false")
-            << ", \"thumbnail\": " << (r.thumbnail.empty() ? "null" : Json("report-row" + std::to_string(r.row) + ".png"))
+            << ", \"thumbnail\": " << (r.thumbnail.empty() ? "null" : JsonText("report-row" + std::to_string(r.row) + ".png"))
             << "}";
     }
     out << "]}\n";
@@ -246,7 +229,7 @@ std::string WriteReport(const ReportRequest& request)
     }
     const std::string digest = request.hash ? Sha256OfFile(request.disk) : "";
     const std::string made = IsoUtc(static_cast<double>(std::time(nullptr)));
-    WriteJson(request.folder + "/report.json", request, made, summary, digest, findings, rows,
+    WriteJsonText(request.folder + "/report.json", request, made, summary, digest, findings, rows,
               reader.m_skippedPositions);
     WriteCsv(request.folder + "/report.csv", rows);
     WriteHtml(request.folder + "/report.html", request, made, summary, digest, findings, rows,
