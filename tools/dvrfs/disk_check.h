@@ -8,6 +8,7 @@
 #include <cstdint>
 #include <functional>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "catalog/catalog_reader.h"
@@ -59,6 +60,12 @@ struct ExtractedFrame {
     std::size_t size;
     long long place;  // among the recording's frames, damaged ones counted
 };
+
+// The data blocks of a recording as numbers to walk, first and last (last
+// beyond the ring when the recording wraps), at most one turn of a ring of
+// `ringSize` blocks: a recording never holds a block twice. Each number is
+// reduced to the ring before it is read.
+std::pair<std::int64_t, std::int64_t> RecordingBlockSpan(const _HisiList_t& recording, std::int64_t ringSize);
 
 // The list entry of catalogue row `row` of a built catalogue, read again from
 // the disk; false when there is no such row or it cannot be read.

@@ -8,6 +8,7 @@
 #include <cmath>
 #include <cstdio>
 #include <memory>
+#include <utility>
 #include <vector>
 
 extern "C" {
@@ -147,11 +148,7 @@ std::string EncodePng(const AVFrame* frame, int width)
 long long CountFrames(CatalogReader& reader, const _HisiList_t& recording)
 {
     const std::int64_t ringSize = reader.m_volume->adapter->DataBlockMax;
-    const std::int64_t start = recording.StartBlock;
-    std::int64_t last = recording.EndBlock;
-    if (start > last)
-        last += ringSize;
-    last = std::min(last, start + ringSize - 1);
+    const auto [start, last] = RecordingBlockSpan(recording, ringSize);
     long long frames = 0;
     for (std::int64_t n = start; n <= last; ++n) {
         _HisiBlockHeader_t header{};
@@ -260,8 +257,11 @@ private:
 // after its end stay out; the rest are written with the time of their place.
 class ExportSink {
 public:
-    ExportSink(const _HisiList_t& recording, const ExportRequest& request, long long frames, ExportOutcome& outcome)
-        : recording_(recording), request_(request), frames_(frames), outcome_(outcome)
+    // `countFrames` gives the recording's length in frames, asked only when
+    // the stream carries no timing of its own.
+    ExportSink(const _HisiList_t& recording, const ExportRequest& request, std::function<long long()> countFrames,
+               ExportOutcome& outcome)
+        : recording_(recording), request_(request), countFrames_(std::move(countFrames)), outcome_(outcome)
     {
     }
 
@@ -331,9 +331,11 @@ private:
         const double fromStream =
             facts.framerate.num > 0 && facts.framerate.den > 0 ? av_q2d(facts.framerate) : 0.0;
         outcome_.timingFromStream = fromStream >= 0.5 && fromStream <= 240;
-        outcome_.framesPerSecond = outcome_.timingFromStream ? fromStream
-                                   : duration > 0 && frames_ > 0 ? static_cast<double>(frames_) / duration
-                                                                 : 25.0;
+        outcome_.framesPerSecond = fromStream;
+        if (!outcome_.timingFromStream) {
+            const long long frames = duration > 0 ? countFrames_() : 0;
+            outcome_.framesPerSecond = frames > 0 ? static_cast<double>(frames) / duration : 25.0;
+        }
         return true;
     }
 
@@ -368,7 +370,7 @@ private:
 
     const _HisiList_t& recording_;
     const ExportRequest& request_;
-    long long frames_;
+    std::function<long long()> countFrames_;
     ExportOutcome& outcome_;
     Muxer muxer_;
     bool started_ = false;
@@ -428,7 +430,7 @@ ExportOutcome ExportRecording(CatalogReader& reader, const _HisiList_t& recordin
         outcome.error = "the disk has no data ring";
         return outcome;
     }
-    ExportSink sink(recording, request, CountFrames(reader, recording), outcome);
+    ExportSink sink(recording, request, [&reader, &recording] { return CountFrames(reader, recording); }, outcome);
     outcome.extracted = ExtractRecording(
         reader, recording, [&sink](const ExtractedFrame& frame) { return sink.Take(frame); }, progress);
     if (sink.Finished())

@@ -161,6 +161,15 @@ bool RecordingOfRow(CatalogReader& reader, int row, _HisiList_t* recording)
                            1) > 0;
 }
 
+std::pair<std::int64_t, std::int64_t> RecordingBlockSpan(const _HisiList_t& recording, std::int64_t ringSize)
+{
+    const std::int64_t start = recording.StartBlock;
+    std::int64_t last = recording.EndBlock;
+    if (start > last)
+        last += ringSize;
+    return {start, std::min(last, start + ringSize - 1)};
+}
+
 ExtractResult ExtractRecording(CatalogReader& reader, const _HisiList_t& recording,
                                const std::function<bool(const ExtractedFrame&)>& sink,
                                const std::function<void(double)>& progress)
@@ -168,12 +177,7 @@ ExtractResult ExtractRecording(CatalogReader& reader, const _HisiList_t& recordi
     if (!reader.m_volume || !reader.m_volume->adapter || reader.m_volume->adapter->DataBlockMax <= 0)
         return ExtractResult{};
     const std::int64_t ringSize = reader.m_volume->adapter->DataBlockMax;
-    const std::int64_t start = recording.StartBlock;
-    std::int64_t last = recording.EndBlock;
-    if (start > last)
-        last += ringSize;
-    last = std::min(last, start + ringSize - 1);  // a recording never holds a block twice
-
+    const auto [start, last] = RecordingBlockSpan(recording, ringSize);
     Extraction extraction(reader, sink);
     for (std::int64_t n = start; n <= last; ++n) {
         if (progress)
