@@ -54,9 +54,10 @@ std::string WhyNotOpened(const std::string& path)
 std::string WhyNotARecorderDisk(const CatalogReader& reader, const std::string& path)
 {
     struct stat info {};
-    if (::stat(path.c_str(), &info) == 0 && S_ISDIR(info.st_mode))
+    const bool known = ::stat(path.c_str(), &info) == 0;
+    if (known && S_ISDIR(info.st_mode))
         return std::string("cannot read: ") + std::strerror(EISDIR);
-    if (::stat(path.c_str(), &info) == 0 && S_ISREG(info.st_mode) && info.st_size == 0)
+    if (known && S_ISREG(info.st_mode) && info.st_size == 0)
         return "not a recorder disk (the image is empty)";
     switch (reader.m_errorCode) {
     case kErrBlockTable:
