@@ -114,7 +114,7 @@ std::string EwfError(libewf_error_t* error)
 }
 
 // An Expert Witness image through libewf, which finds its segments from the
-// first one's name and checks each chunk as it reads it.
+// first one's name; each chunk is checked against its checksum as it is read.
 class EwfSource : public ImageSource {
 public:
     ~EwfSource() override
@@ -137,31 +137,40 @@ public:
         m_segments = count;
         const bool opened = libewf_handle_initialize(&m_handle, &error) == 1 &&
                             libewf_handle_open(m_handle, names, count, LIBEWF_OPEN_READ, &error) == 1 &&
-                            libewf_handle_get_media_size(m_handle, &m_size, &error) == 1;
+                            libewf_handle_get_media_size(m_handle, &m_size, &error) == 1 &&
+                            libewf_handle_get_chunk_size(m_handle, &m_chunkSize, &error) == 1;
         libewf_glob_free(names, count, nullptr);
-        if (!opened)
+        if (!opened) {
             *message = EwfError(error);
-        return opened;
+            return false;
+        }
+        if (m_chunkSize == 0 || m_chunkSize > kMaxChunkSize) {
+            *message = "its chunk size (" + std::to_string(m_chunkSize) + " bytes) is beyond what this tool reads";
+            return false;
+        }
+        m_stored.resize(m_chunkSize + kChunkSlack);
+        m_chunk.resize(m_chunkSize + kChunkSlack);
+        return true;
     }
 
     long long Read(std::uint64_t offset, char* dest, std::size_t size) override
     {
-        if (offset >= m_size)
-            return 0;
-        libewf_error_t* error = nullptr;
-        const ssize_t got = libewf_handle_read_random(m_handle, dest, size, static_cast<off64_t>(offset), &error);
-        if (got < 0) {
-            libewf_error_free(&error);
-            return -1;
+        long long done = 0;
+        while (size > 0 && offset < m_size) {
+            const std::uint64_t index = offset / m_chunkSize;
+            if (!LoadChunk(index))
+                return done > 0 ? done : -1;
+            const std::size_t within = static_cast<std::size_t>(offset - index * m_chunkSize);
+            if (within >= m_chunkLength)
+                break;  // a chunk shorter than the media says: the rest is not there
+            const std::size_t piece = std::min(size, m_chunkLength - within);
+            std::copy_n(m_chunkData + within, piece, dest);
+            done += static_cast<long long>(piece);
+            dest += piece;
+            offset += piece;
+            size -= piece;
         }
-        // Where libewf checks a chunk's checksum, it hands a failing chunk on
-        // and only counts it: such a chunk reads as an unreadable sector.
-        std::uint32_t errors = 0;
-        if (libewf_handle_get_number_of_checksum_errors(m_handle, &errors, nullptr) == 1 && errors > m_checksumErrors) {
-            m_checksumErrors = errors;
-            return -1;
-        }
-        return got;
+        return done;
     }
 
     std::uint64_t Size() const override { return m_size; }
@@ -195,10 +204,53 @@ public:
     }
 
 private:
+    // Chunks are read whole, stored bytes first, then unpacked and checked
+    // against their checksum. This libewf's own buffered read keeps the
+    // buffer of every chunk it fails to read (a damaged image read that way
+    // costs memory without bound) and hands on a stored chunk whose checksum
+    // fails. The last chunk read is kept for the reads that follow it.
+    bool LoadChunk(std::uint64_t index)
+    {
+        if (index == m_chunkIndex)
+            return true;
+        m_chunkIndex = kNoChunk;
+        libewf_error_t* error = nullptr;
+        std::int8_t compressed = 0;
+        std::int8_t checksumRead = 0;
+        std::uint32_t checksum = 0;
+        std::uint8_t storedChecksum[4];
+        ssize_t stored = -1;
+        if (libewf_handle_seek_offset(m_handle, static_cast<off64_t>(index * m_chunkSize), SEEK_SET, &error) >= 0)
+            stored = libewf_handle_read_chunk(m_handle, m_stored.data(), m_stored.size(), &compressed, storedChecksum,
+                                              &checksum, &checksumRead, &error);
+        std::size_t length = m_chunk.size();
+        if (stored < 0 || libewf_handle_prepare_read_chunk(m_handle, m_stored.data(), static_cast<std::size_t>(stored),
+                                                           m_chunk.data(), &length, compressed, checksum,
+                                                           checksumRead, &error) < 0) {
+            libewf_error_free(&error);
+            return false;
+        }
+        // A compressed chunk is unpacked into the second buffer; a stored one
+        // is checked where it lies.
+        m_chunkData = compressed ? m_chunk.data() : m_stored.data();
+        m_chunkLength = std::min<std::size_t>(length, m_chunkSize);
+        m_chunkIndex = index;
+        return true;
+    }
+
+    static constexpr std::uint32_t kMaxChunkSize = 64u << 20;
+    static constexpr std::size_t kChunkSlack = 4096;  // a stored chunk may be a little larger than its data
+    static constexpr std::uint64_t kNoChunk = ~0ull;
+
     libewf_handle_t* m_handle = nullptr;
     size64_t m_size = 0;
+    std::uint32_t m_chunkSize = 0;
     int m_segments = 0;
-    std::uint32_t m_checksumErrors = 0;  // as libewf counted them so far
+    std::vector<std::uint8_t> m_stored;
+    std::vector<std::uint8_t> m_chunk;
+    std::uint64_t m_chunkIndex = kNoChunk;
+    const std::uint8_t* m_chunkData = nullptr;
+    std::size_t m_chunkLength = 0;
 };
 
 }  // namespace

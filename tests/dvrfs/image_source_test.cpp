@@ -118,10 +118,9 @@ TEST_F(ImageSourceTest, SplitAndE01ImagesReadAsTheRawImage)
 }
 
 // A byte flipped in a chunk of the segment file, inside data block 1's
-// payload: the tool goes on, everything else reads as before, and only the
-// recording that holds the byte differs (this libewf hands on an
-// uncompressed chunk without checking its checksum, as a raw image with a
-// bad byte would; a chunk it cannot read at all reads as an unreadable sector).
+// payload: that chunk fails its checksum and reads as an unreadable sector,
+// the tool goes on, everything else reads as before, and only the recording
+// that holds the chunk differs.
 TEST_F(ImageSourceTest, DamagedE01ChunkLeavesTheRestReadable)
 {
     const Digest raw = Read(raw_);
@@ -139,6 +138,12 @@ TEST_F(ImageSourceTest, DamagedE01ChunkLeavesTheRestReadable)
     ASSERT_NE(found, segment.end());
     *found ^= 0x55;
     std::ofstream(e01, std::ios::binary).write(segment.data(), static_cast<std::streamsize>(segment.size()));
+
+    CatalogReader reader;
+    ASSERT_EQ(reader.OpenDVRFS(wxString::FromUTF8(e01.c_str())), 1);
+    char byte = 0;
+    EXPECT_EQ(reader.m_imageSource->Read(at, &byte, 1), -1);
+    EXPECT_EQ(reader.m_imageSource->Read(at - 32768, &byte, 1), 1);
 
     const Digest damaged = Read(e01);
     EXPECT_EQ(damaged.rows, 2);
