@@ -6,6 +6,7 @@
 
 #include <wx/log.h>
 
+#include "dvrfs/image_source.h"
 #include "tools/dvrfs/disk_check.h"
 
 namespace dvrfstool {
@@ -78,14 +79,20 @@ private:
                                  static_cast<int>(size)) > 0;
     }
 
-    // The device, opened as the volume open does, with an empty volume for
-    // the superblock loads to fill.
+    // The device or image, opened as the volume open does (in place of what
+    // the failed open left), with an empty volume for the superblock loads
+    // to fill.
     bool OpenWithoutVerifying(const wxString& path)
     {
+        reader_.CloseDVRFS();
         reader_.m_diskFile = new wxFile;
         reader_.m_volume = new DvrVolume;
         wxLogNull quiet;
-        return reader_.m_diskFile->Open(path, wxFile::read);
+        if (!reader_.m_diskFile->Open(path, wxFile::read))
+            return false;
+        std::string sourceError;
+        reader_.m_imageSource = dvrfs::OpenImageSource(path.utf8_string(), &sourceError);
+        return reader_.m_imageSource || sourceError.empty();
     }
 
     // Both copies of the superblock and block table, each checked as the
