@@ -211,6 +211,14 @@ check "export that cannot write its output" 5 $?
 check "export -o - writes an MP4 to standard output" 0 $?
 out=$("$dvrfs" export "$work/clip.img" --from 1700000001 --to 2023-11-14T23:13:21Z -o "$work/range/" 2>/dev/null | grep -c '^sha256')
 check "export of a time range: each recording that overlaps it" 2 "$out"
+out=$(TZ=Europe/Berlin "$dvrfs" export "$work/clip.img" --from 1700000001 --to 2023-11-14T23:13:21Z --merge \
+  --local -o "$work/range/" 2>"$work/err" | grep -v '^sha256')
+check "export --merge of a range whose damaged block lies after it: complete" 0 "${PIPESTATUS[0]}"
+check "export --merge: the recordings of the range in one file, --local times" \
+  "$work/range/rows0-1-20231114T221320Z.mp4: rows 0 to 1 (2 recordings), 50 frames, 3600.0 s from 2023-11-14T23:13:21+0100, 25 frames/s (the stream's timing)" "$out"
+check "export --merge: no warning of the damage outside the range" "" "$(cat "$work/err")"
+check "list --local: the date and time in the workstation's zone" "$(printf '0\t0\t1700000000\t1700000002\t2023/11/14 23:13:20-23:13:22')" \
+  "$(TZ=Europe/Berlin "$dvrfs" list --local "$work/clip.img" | head -1)"
 
 # --- report
 "$dvrfs" report "$work/clip.img" -o "$work/report" >/dev/null

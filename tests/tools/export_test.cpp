@@ -103,4 +103,31 @@ INSTANTIATE_TEST_SUITE_P(
                    "2023-11-14T23:13:20.000000Z"}),
     [](const ::testing::TestParamInfo<ExportCase>& info) { return std::string(info.param.name); });
 
+// Both recordings in one file on one timeline: rows 0 (2 s) and 1 (4 s, an
+// hour later) keep their frames and the hour between them.
+using MergedExportTest = DiskTest;
+
+TEST_F(MergedExportTest, RecordingsShareOneFileAndKeepThePauseBetweenThem)
+{
+    const std::string disk = dir_ + "/disk.img";
+    WriteClipDisk(disk, {{0, 0, 1, 1700000000, 2}, {1, 2, 5, 1700003600, 4}});
+    CatalogReader reader;
+    ASSERT_EQ(reader.BuildCatalog(wxString::FromUTF8(disk.c_str())), CatalogBuild::kBuilt);
+    std::vector<_HisiList_t> recordings(2);
+    ASSERT_TRUE(dvrfstool::RecordingOfRow(reader, 0, &recordings[0]));
+    ASSERT_TRUE(dvrfstool::RecordingOfRow(reader, 1, &recordings[1]));
+    dvrfstool::ExportRequest request;
+    request.output = dir_ + "/merged.mp4";
+
+    const std::vector<dvrfstool::ExportOutcome> outcomes = dvrfstool::ExportRecordings(reader, recordings, request);
+    ASSERT_EQ(outcomes.size(), 2u);
+    EXPECT_EQ(outcomes[1].error, "");
+    EXPECT_EQ(outcomes[0].framesWritten + outcomes[1].framesWritten, 150);
+    EXPECT_EQ(outcomes[1].firstTime, 1700003600u);
+    const Probed probed = Probe(request.output);
+    EXPECT_EQ(probed.packets, 150);
+    EXPECT_NEAR(probed.seconds, 3604.0, 1.0);
+    EXPECT_EQ(probed.creationTime, "2023-11-14T22:13:20.000000Z");
+}
+
 }  // namespace

@@ -34,6 +34,26 @@ bool ParseCommandLine(int argc, char** argv, CommandLine* line)
     return true;
 }
 
+namespace {
+Zone textZone = Zone::kUtc;
+}  // namespace
+
+void SetTextZone(Zone zone)
+{
+    textZone = zone;
+}
+
+std::string TextTime(double seconds)
+{
+    return TimeText(static_cast<std::time_t>(seconds), textZone == Zone::kUtc ? "%Y-%m-%dT%H:%M:%SZ" : "%Y-%m-%dT%H:%M:%S%z",
+                    textZone);
+}
+
+const char* TextZoneName()
+{
+    return textZone == Zone::kUtc ? "UTC" : "local time";
+}
+
 int UsageError(const std::string& message)
 {
     std::fprintf(stderr, "dvrfs: %s\nTry 'dvrfs --help'.\n", message.c_str());

@@ -12,6 +12,7 @@
 #include <vector>
 
 #include "catalog/catalog_reader.h"
+#include "catalog/time_text.h"
 
 namespace dvrfscli {
 
@@ -43,6 +44,14 @@ struct CommandLine {
 bool ParseCommandLine(int argc, char** argv, CommandLine* line);
 
 int UsageError(const std::string& message);
+
+// The zone of the times that the text outputs print: UTC, or with --local
+// the workstation's. JSON times stay UTC.
+void SetTextZone(Zone zone);
+// "2023-11-14T22:13:20Z" in UTC, "2023-11-14T23:13:20+0100" in local time.
+std::string TextTime(double seconds);
+// "UTC" or "local time".
+const char* TextZoneName();
 
 // A progress bar on standard error, redrawn at most ten times a second, and
 // only when standard error is a terminal.

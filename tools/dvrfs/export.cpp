@@ -252,6 +252,14 @@ private:
     bool opened_ = false;
 };
 
+// The file the recordings go into and where on its timeline they are: the
+// clock time of its first frame, and the last time stamp written.
+struct OutputFile {
+    Muxer muxer;
+    double origin = 0;
+    std::int64_t lastPts = -1;
+};
+
 // Frames on their way from the extraction to the file: those before the
 // first frame that starts a stream, before the time range's key frame or
 // after its end stay out; the rest are written with the time of their place.
@@ -260,8 +268,12 @@ public:
     // `countFrames` gives the recording's length in frames, asked only when
     // the stream carries no timing of its own.
     ExportSink(const _HisiList_t& recording, const ExportRequest& request, std::function<long long()> countFrames,
-               ExportOutcome& outcome)
-        : recording_(recording), request_(request), countFrames_(std::move(countFrames)), outcome_(outcome)
+               OutputFile& file, ExportOutcome& outcome)
+        : recording_(recording),
+          request_(request),
+          countFrames_(std::move(countFrames)),
+          file_(file),
+          outcome_(outcome)
     {
     }
 
@@ -290,16 +302,12 @@ public:
         return Write(frame.data, frame.size, frame.place, key);
     }
 
-    std::string Finish()
+    void Finish()
     {
         for (const Held& held : gop_)  // a range that ends before the next key frame
             if (!Write(held.bytes.data(), held.bytes.size(), held.place, held.key))
                 break;
         gop_.clear();
-        const std::string closed = muxer_.Close();
-        if (outcome_.error.empty())
-            outcome_.error = closed;
-        return outcome_.error;
     }
 
     bool Finished() const { return finished_; }
@@ -339,45 +347,52 @@ private:
         return true;
     }
 
+    // A frame's time: the recording's start and the frame's place over the
+    // frame rate (counted from 0 for a run of blocks whose time no entry gives).
     double TimeOf(long long place) const
     {
-        if (recording_.StartTime == 0)
-            return 0;  // no known time: none is claimed
         return recording_.StartTime + (outcome_.framesPerSecond > 0 ? place / outcome_.framesPerSecond : 0.0);
     }
 
     bool Write(const unsigned char* data, std::size_t size, long long place, bool key)
     {
-        if (firstPlace_ < 0) {
-            // The file's creation time is its first frame's.
-            firstPlace_ = place;
-            outcome_.firstTime = static_cast<std::uint32_t>(std::max(TimeOf(place), 0.0));
-            outcome_.error = muxer_.Open(request_, facts_, sets_, outcome_.firstTime);
+        if (!file_.muxer.IsOpen()) {
+            // The file's creation time is its first frame's; none is claimed
+            // for a run of blocks.
+            outcome_.firstTime =
+                recording_.StartTime == 0 ? 0 : static_cast<std::uint32_t>(std::max(TimeOf(place), 0.0));
+            outcome_.error = file_.muxer.Open(request_, facts_, sets_, outcome_.firstTime);
             if (!outcome_.error.empty())
                 return false;
+            file_.origin = TimeOf(place);
+        } else if (outcome_.framesWritten == 0) {
+            outcome_.firstTime = static_cast<std::uint32_t>(std::max(TimeOf(place), 0.0));
         }
         const double tick = kTimeBase.den / outcome_.framesPerSecond;
-        const std::int64_t pts = std::llround(static_cast<double>(place - firstPlace_) * tick);
-        const std::string error = muxer_.Write(data, size, pts, std::llround(tick), key);
+        // A later recording never steps back on the file's timeline, even
+        // where a damaged disk says it began before the previous one ended.
+        const std::int64_t pts =
+            std::max<std::int64_t>(std::llround((TimeOf(place) - file_.origin) * kTimeBase.den), file_.lastPts + 1);
+        const std::string error = file_.muxer.Write(data, size, pts, std::llround(tick), key);
         if (!error.empty()) {
             outcome_.error = error;
             return false;
         }
+        file_.lastPts = pts;
         ++outcome_.framesWritten;
-        outcome_.seconds = static_cast<double>(place - firstPlace_ + 1) / outcome_.framesPerSecond;
+        outcome_.seconds = (static_cast<double>(pts) + tick) / kTimeBase.den;
         return true;
     }
 
     const _HisiList_t& recording_;
     const ExportRequest& request_;
     std::function<long long()> countFrames_;
+    OutputFile& file_;
     ExportOutcome& outcome_;
-    Muxer muxer_;
     bool started_ = false;
     StreamFacts facts_;
     std::vector<std::uint8_t> sets_;
     std::vector<Held> gop_;  // while before the range: the frames since the last key frame
-    long long firstPlace_ = -1;
     bool finished_ = false;
 };
 
@@ -425,18 +440,42 @@ std::string IsoUtc(double seconds)
 ExportOutcome ExportRecording(CatalogReader& reader, const _HisiList_t& recording, const ExportRequest& request,
                               const std::function<void(double)>& progress)
 {
-    ExportOutcome outcome;
+    return ExportRecordings(reader, {recording}, request, progress).front();
+}
+
+std::vector<ExportOutcome> ExportRecordings(CatalogReader& reader, const std::vector<_HisiList_t>& recordings,
+                                            const ExportRequest& request,
+                                            const std::function<void(double)>& progress)
+{
+    std::vector<ExportOutcome> outcomes(recordings.size());
     if (!reader.m_volume || !reader.m_volume->adapter || reader.m_volume->adapter->DataBlockMax <= 0) {
-        outcome.error = "the disk has no data ring";
-        return outcome;
+        for (ExportOutcome& outcome : outcomes)
+            outcome.error = "the disk has no data ring";
+        return outcomes;
     }
-    ExportSink sink(recording, request, [&reader, &recording] { return CountFrames(reader, recording); }, outcome);
-    outcome.extracted = ExtractRecording(
-        reader, recording, [&sink](const ExtractedFrame& frame) { return sink.Take(frame); }, progress);
-    if (sink.Finished())
-        outcome.extracted.written = true;  // the range ended, or the error says why
-    sink.Finish();
-    return outcome;
+    OutputFile file;
+    for (std::size_t i = 0; i < recordings.size(); ++i) {
+        const _HisiList_t& recording = recordings[i];
+        ExportOutcome& outcome = outcomes[i];
+        ExportSink sink(recording, request, [&reader, &recording] { return CountFrames(reader, recording); }, file,
+                        outcome);
+        const double share = 1.0 / static_cast<double>(recordings.size());
+        outcome.extracted = ExtractRecording(
+            reader, recording, [&sink](const ExtractedFrame& frame) { return sink.Take(frame); },
+            [&](double fraction) {
+                if (progress)
+                    progress((static_cast<double>(i) + fraction) * share);
+            });
+        if (sink.Finished())
+            outcome.extracted.written = true;  // the range ended, or the error says why
+        sink.Finish();
+        if (!outcome.error.empty())
+            return outcomes;
+    }
+    const std::string closed = file.muxer.Close();
+    if (outcomes.back().error.empty())
+        outcomes.back().error = closed;
+    return outcomes;
 }
 
 std::string Sha256OfFile(const std::string& path, const std::function<void(std::uint64_t)>& progress)

@@ -8,6 +8,7 @@
 #include <functional>
 #include <optional>
 #include <string>
+#include <vector>
 
 #include "tools/dvrfs/disk_check.h"
 
@@ -45,6 +46,14 @@ struct ExportOutcome {
 // first frame's time.
 ExportOutcome ExportRecording(CatalogReader& reader, const _HisiList_t& recording, const ExportRequest& request,
                               const std::function<void(double)>& progress = {});
+
+// Several recordings into one file, in the order given, on one timeline:
+// each frame at its recording's own time, so the pauses between recordings
+// stay gaps in the file. One outcome each; an error that stopped the file is
+// in the outcome of the recording it stopped at (or the last).
+std::vector<ExportOutcome> ExportRecordings(CatalogReader& reader, const std::vector<_HisiList_t>& recordings,
+                                            const ExportRequest& request,
+                                            const std::function<void(double)>& progress = {});
 
 // Whether an H.264 access unit holds an IDR slice (a frame that needs no other).
 bool IsKeyFrame(const unsigned char* data, std::size_t size);

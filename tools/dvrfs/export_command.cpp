@@ -41,11 +41,12 @@ bool ParseTime(const std::string& text, std::uint32_t* seconds)
     return true;
 }
 
-// "row3-20231115T021320Z.mp4"
-std::string FileName(int row, std::uint32_t start, dvrfstool::ExportFormat format)
+// "row3-20231115T021320Z.mp4", or for rows merged "rows1-3-20231115T021320Z.mp4"
+std::string FileName(const std::vector<int>& rows, std::uint32_t start, dvrfstool::ExportFormat format)
 {
-    return "row" + std::to_string(row) + "-" + TimeText(start, "%Y%m%dT%H%M%SZ", Zone::kUtc) + "." +
-           dvrfstool::Extension(format);
+    const std::string which = rows.size() == 1 ? "row" + std::to_string(rows.front())
+                                               : "rows" + std::to_string(rows.front()) + "-" + std::to_string(rows.back());
+    return which + "-" + TimeText(start, "%Y%m%dT%H%M%SZ", Zone::kUtc) + "." + dvrfstool::Extension(format);
 }
 
 bool IsDirectory(const std::string& path)
@@ -89,12 +90,22 @@ bool ChooseRows(const CommandLine& line, const CatalogReader& reader, const dvrf
     return true;
 }
 
-// Names each stretch that was left out, with the time it covers.
-void WarnLeftOut(int row, const dvrfstool::ExportOutcome& outcome, std::uint32_t start)
+// Names each stretch that was left out, with the time it covers; those
+// wholly outside the time range asked for are no loss and go unnamed.
+// Whether anything was left out.
+bool WarnLeftOut(int row, const dvrfstool::ExportOutcome& outcome, std::uint32_t start,
+                 const dvrfstool::ExportRequest& request)
 {
     const double fps = outcome.framesPerSecond > 0 ? outcome.framesPerSecond : 25.0;
-    auto time = [&](long long place) { return dvrfstool::IsoUtc(start + place / fps); };
+    auto seconds = [&](long long place) { return start + place / fps; };
+    auto time = [&](long long place) { return TextTime(seconds(place)); };
+    // Past the stretches kept, the rest are only counted: they count.
+    bool leftOut = outcome.extracted.leftOut.size() >= dvrfstool::kMaxLeftOutKept || outcome.framesBeforeAKeyFrame > 0;
     for (const dvrfstool::LeftOut& gap : outcome.extracted.leftOut) {
+        if (request.from &&
+            (seconds(gap.firstFrame) >= *request.to || seconds(gap.firstFrame + gap.frames) < *request.from))
+            continue;
+        leftOut = true;
         if (gap.block >= 0)
             std::fprintf(stderr, "dvrfs: warning: row %d: data block %lld left out (header damaged), after %s\n", row,
                          gap.block, time(gap.firstFrame).c_str());
@@ -105,35 +116,57 @@ void WarnLeftOut(int row, const dvrfstool::ExportOutcome& outcome, std::uint32_t
     if (outcome.framesBeforeAKeyFrame > 0)
         std::fprintf(stderr, "dvrfs: warning: row %d: %lld frame(s) before the first key frame left out\n", row,
                      outcome.framesBeforeAKeyFrame);
+    return leftOut;
 }
 
-// Exports one row; kOk, kLeftOut or kOutputFailed.
-int ExportRow(CatalogReader& reader, const std::string& disk, int row, const std::string& output, bool force,
-              dvrfstool::ExportRequest request)
+// Exports rows into one file (one row, or all of them with --merge); kOk,
+// kLeftOut or kOutputFailed.
+int ExportRows(CatalogReader& reader, const std::string& disk, const std::vector<int>& rows,
+               const std::string& output, bool force, dvrfstool::ExportRequest request)
 {
-    _HisiList_t recording{};
-    if (!dvrfstool::RecordingOfRow(reader, row, &recording)) {
-        std::fprintf(stderr, "dvrfs: %s: row %d: its recording entry cannot be read any more\n", disk.c_str(), row);
-        return kLeftOut;
+    std::vector<_HisiList_t> recordings;
+    std::vector<int> readable;
+    int status = kOk;
+    for (int row : rows) {
+        _HisiList_t recording{};
+        if (!dvrfstool::RecordingOfRow(reader, row, &recording)) {
+            std::fprintf(stderr, "dvrfs: %s: row %d: its recording entry cannot be read any more\n", disk.c_str(), row);
+            status = kLeftOut;
+            continue;
+        }
+        recordings.push_back(recording);
+        readable.push_back(row);
     }
+    if (recordings.empty())
+        return status;
     if (output != "-") {
-        if (const int status = CheckOutput(disk, output, force); status != kOk)
-            return status;
+        if (const int checked = CheckOutput(disk, output, force); checked != kOk)
+            return checked;
     }
     request.output = output;
-    dvrfstool::ExportOutcome outcome;
+    std::vector<dvrfstool::ExportOutcome> outcomes;
     {
         ProgressBar bar;
-        outcome = dvrfstool::ExportRecording(reader, recording, request, [&bar](double f) { bar.Show(f); });
+        outcomes = dvrfstool::ExportRecordings(reader, recordings, request, [&bar](double f) { bar.Show(f); });
     }
-    if (!outcome.error.empty()) {
-        std::fprintf(stderr, "dvrfs: cannot write %s: %s\n", output.c_str(), outcome.error.c_str());
-        return kOutputFailed;
+    for (const dvrfstool::ExportOutcome& outcome : outcomes) {
+        if (!outcome.error.empty()) {
+            std::fprintf(stderr, "dvrfs: cannot write %s: %s\n", output.c_str(), outcome.error.c_str());
+            return kOutputFailed;
+        }
     }
     FILE* say = output == "-" ? stderr : stdout;
-    std::fprintf(say, "%s: row %d, %lld frames, %.1f s from %s, %.3g frames/s (%s)\n", output.c_str(), row,
-                 outcome.framesWritten, outcome.seconds, dvrfstool::IsoUtc(outcome.firstTime).c_str(),
-                 outcome.framesPerSecond, outcome.timingFromStream ? "the stream's timing" : "the recording's times");
+    long long frames = 0;
+    for (const dvrfstool::ExportOutcome& outcome : outcomes)
+        frames += outcome.framesWritten;
+    const dvrfstool::ExportOutcome& first = outcomes.front();
+    std::string which = "row " + std::to_string(readable.front());
+    if (readable.size() > 1)
+        which = "rows " + std::to_string(readable.front()) + " to " + std::to_string(readable.back()) + " (" +
+                std::to_string(readable.size()) + " recordings)";
+    std::fprintf(say, "%s: %s, %lld frames, %.1f s from %s, %.3g frames/s (%s)\n", output.c_str(), which.c_str(),
+                 frames, outcomes.back().seconds, TextTime(first.firstTime).c_str(), first.framesPerSecond,
+                 first.timingFromStream ? "the stream's timing" : "the recording's times");
     if (output != "-") {
         const std::string digest = dvrfstool::Sha256OfFile(output);
         std::ofstream sidecar(output + ".sha256");
@@ -144,10 +177,10 @@ int ExportRow(CatalogReader& reader, const std::string& disk, int row, const std
         }
         std::printf("sha256 %s  %s\n", digest.c_str(), output.c_str());
     }
-    WarnLeftOut(row, outcome, recording.StartTime);
-    const bool complete = outcome.extracted.leftOut.empty() && outcome.extracted.skippedFrames == 0 &&
-                          outcome.extracted.skippedBlocks == 0 && outcome.framesBeforeAKeyFrame == 0;
-    return complete ? kOk : kLeftOut;
+    for (std::size_t i = 0; i < outcomes.size(); ++i)
+        if (WarnLeftOut(readable[i], outcomes[i], recordings[i].StartTime, request))
+            status = kLeftOut;
+    return status;
 }
 
 // Exports a run of blocks no list entry describes, as recover lists them:
@@ -208,7 +241,7 @@ int RecoverCommand(const std::string& disk, bool json)
     auto when = [json](const std::optional<std::uint32_t>& t) {
         if (!t)
             return std::string(json ? "null" : "-");
-        return json ? "\"" + dvrfstool::IsoUtc(*t) + "\"" : dvrfstool::IsoUtc(*t);
+        return json ? "\"" + dvrfstool::IsoUtc(*t) + "\"" : TextTime(*t);
     };
     if (json) {
         std::printf("{\"blocks_scanned\": %lld, \"headers_read\": %lld, \"runs\": [",
@@ -228,9 +261,9 @@ int RecoverCommand(const std::string& disk, bool json)
         std::printf("blocks %lld:%lld\t%lld blocks\t%lld frames\tafter %s\tbefore %s\n",
                     static_cast<long long>(run.firstBlock), static_cast<long long>(run.lastBlock),
                     static_cast<long long>(run.blocks), run.frames, when(run.after).c_str(), when(run.before).c_str());
-    std::fprintf(stderr, "dvrfs: %zu run(s) of unlisted blocks; %lld blocks scanned, %lld headers read (UTC)\n",
+    std::fprintf(stderr, "dvrfs: %zu run(s) of unlisted blocks; %lld blocks scanned, %lld headers read (%s)\n",
                  result.runs.size(), static_cast<long long>(result.blocksScanned),
-                 static_cast<long long>(result.headersRead));
+                 static_cast<long long>(result.headersRead), TextZoneName());
     return kOk;
 }
 
@@ -275,14 +308,22 @@ int ExportCommand(const CommandLine& line)
         std::filesystem::create_directories(target, error);  // a folder named as one is made
     }
     const bool intoFolder = IsDirectory(target);
-    if (!intoFolder && rows.size() > 1)
-        return UsageError(target + " is no folder: several recordings need one");
+    const bool merge = line.Has("--merge");
+    if (!intoFolder && rows.size() > 1 && !merge)
+        return UsageError(target + " is no folder: several recordings need one, or --merge");
+    // One file for all the rows with --merge, else one for each.
+    std::vector<std::vector<int>> files;
+    if (merge)
+        files.push_back(rows);
+    else
+        for (int row : rows)
+            files.push_back({row});
     int status = kOk;
-    for (int row : rows) {
-        const std::uint32_t start = static_cast<std::uint32_t>(reader.m_catalog->Entries[row].StartTime);
+    for (const std::vector<int>& file : files) {
+        const std::uint32_t start = static_cast<std::uint32_t>(reader.m_catalog->Entries[file.front()].StartTime);
         const std::string output =
-            intoFolder ? target + (target.back() == '/' ? "" : "/") + FileName(row, start, request.format) : target;
-        const int result = ExportRow(reader, disk, row, output, line.Has("--force"), request);
+            intoFolder ? target + (target.back() == '/' ? "" : "/") + FileName(file, start, request.format) : target;
+        const int result = ExportRows(reader, disk, file, output, line.Has("--force"), request);
         if (result == kOutputFailed || result == kUsageError)
             return result;
         status = std::max(status, result);

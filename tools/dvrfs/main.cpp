@@ -37,20 +37,25 @@ recordings on. Options may stand before or after the operands.
 
 Commands:
   info DISK [--dump] [--json] the superblock and the current adapter
-  list DISK [--json]          the recordings, as the playback panel lists them
+  list DISK [--json] [--local]
+                              the recordings, as the playback panel lists them
   verify DISK [--json]        read every record once, report damage
   extract DISK ROW -o FILE    the frames of a recording as the raw stream
-  export DISK ROW... [-o FILE|DIR] [--format mp4|mkv|h264]
-  export DISK --from TIME --to TIME [-o DIR]
+  export DISK ROW... [-o FILE|DIR] [--format mp4|mkv|h264] [--merge]
+  export DISK --from TIME --to TIME [-o FILE|DIR] [--merge]
                               recordings as MP4 files with their real time,
                               each with its SHA-256
   hash DISK                   the SHA-256 of the whole disk or image
-  recover DISK [--json]       runs of data blocks no listed recording covers
+  recover DISK [--json] [--local]
+                              runs of data blocks no listed recording covers
   report DISK [-o DIR] [--hash]
                               a case report: JSON, CSV and an HTML page with
                               a picture of each recording
 
 'dvrfs COMMAND --help' says more of each; 'dvrfs --version' names this one.
+
+Text outputs give times in UTC; --local gives them in the workstation's
+local time. JSON times are UTC.
 
 Exit status: 0 success; 1 the disk cannot be opened or read as a recorder
 disk; 2 usage error; 3 verify found damage; 4 export left damaged frames or
@@ -65,11 +70,12 @@ an E01, what it says of its acquisition); superblock_copy whether the
 primary or the backup copy was read. --dump adds the reader's adapter dump;
 --json prints one object instead, the times also as ISO 8601 UTC texts.
 )"},
-    {"list", R"(Usage: dvrfs list DISK [--json]
+    {"list", R"(Usage: dvrfs list DISK [--json] [--local]
 The recordings, as the playback panel lists them: ROW, IDX, START, END
-(seconds since 1970, UTC), DATE TIME (UTC), tab-separated; --json prints one
-object, the times also as ISO 8601 UTC texts (start_utc, end_utc). Entries damaged in both copies are skipped and named on standard
-error (and under "skipped" in the JSON).
+(seconds since 1970, UTC), DATE TIME (UTC; --local: the workstation's local
+time), tab-separated; --json prints one object, the times also as ISO 8601
+UTC texts (start_utc, end_utc). Entries damaged in both copies are skipped
+and named on standard error (and under "skipped" in the JSON).
 )"},
     {"verify", R"(Usage: dvrfs verify DISK [--json]
 Reads every record once (both superblock copies, the 120 adapter slots, the
@@ -83,8 +89,8 @@ Writes the frames of recording ROW (as listed) to FILE, in order, as the raw
 H.264 stream; '-o -' writes to standard output. An existing FILE is replaced
 only with --force. Damaged frames and blocks are left out with a warning.
 )"},
-    {"export", R"(Usage: dvrfs export DISK ROW... [-o FILE|DIR] [--format mp4|mkv|h264] [--force]
-       dvrfs export DISK --from TIME --to TIME [-o DIR] [--format ...]
+    {"export", R"(Usage: dvrfs export DISK ROW... [-o FILE|DIR] [--format mp4|mkv|h264] [--merge] [--force]
+       dvrfs export DISK --from TIME --to TIME [-o FILE|DIR] [--merge] [--format ...]
 Remuxes recordings, without re-encoding, into MP4 (default), Matroska or the
 raw H.264 stream, timed by the stream's own frame rate (or the recording's
 frames over its duration) and with the recording's start as the file's
@@ -92,20 +98,22 @@ creation time. Files are named rowROW-STARTZ.EXT (UTC, ISO 8601 without
 colons) in DIR (default: the current folder); one ROW may name a FILE, or
 '-' for standard output. With --from/--to (seconds since 1970, or
 YYYY-MM-DDTHH:MM:SSZ) every recording that overlaps the range is exported,
-from the key frame at or before its start. Each file's SHA-256 is printed
-and written beside it as FILE.sha256 (sha256sum -c). Damaged frames and
-blocks are left out, named in a warning with their time; the exit status is
-then 4.
+from the key frame at or before its start. --merge writes all the
+recordings into one file (rowsFIRST-LAST-STARTZ.EXT), each frame at its
+recording's own time, so the pauses between recordings stay gaps. Each
+file's SHA-256 is printed and written beside it as FILE.sha256 (sha256sum
+-c). Damaged frames and blocks are left out, named in a warning with their
+time (UTC; --local: the workstation's local time); the exit status is then 4.
 )"},
-    {"recover", R"(Usage: dvrfs recover DISK [--json]
+    {"recover", R"(Usage: dvrfs recover DISK [--json] [--local]
 Scans the header of every data block of the data ring once (one 128-byte
 read per 16 MiB block) and lists the runs of consecutive blocks whose header
 is sound but which no listed recording covers: what the recorder's index
 lost when its list ring wrote over older entries, or when an entry is
 damaged. Each run: its blocks, its frames, and the time it must lie in
 (after the end of the listed recording before it, before the start of the
-one after, UTC). 'extract --blocks FIRST:LAST' and 'export --blocks
-FIRST:LAST' take such a run.
+one after, UTC; --local: the workstation's local time). 'extract --blocks
+FIRST:LAST' and 'export --blocks FIRST:LAST' take such a run.
 )"},
     {"report", R"(Usage: dvrfs report DISK [-o DIR] [--hash]
 A case report on the disk in DIR (default: the current folder):
@@ -255,7 +263,7 @@ void ReportSkipped(const CatalogReader& reader)
                  skipped.size() == 1 ? "y" : "ies", skipped.size() == 1 ? "" : "s", positions.c_str());
 }
 
-int List(const char* disk, bool json)
+int List(const char* disk, bool json, bool local)
 {
     CatalogReader reader;
     if (const int status = BuildCatalog(reader, disk); status != kOk)
@@ -265,8 +273,12 @@ int List(const char* disk, bool json)
     if (!json) {
         for (int row = 0; row < reader.m_recordCount; ++row) {
             const CatalogEntry& e = catalog.Entries[row];
-            std::printf("%d\t%d\t%u\t%u\t%s %s\n", row, e.Idx, static_cast<std::uint32_t>(e.StartTime),
-                        static_cast<std::uint32_t>(e.EndTime), e.DateText, e.TimeText);
+            const std::uint32_t start = static_cast<std::uint32_t>(e.StartTime);
+            const std::uint32_t end = static_cast<std::uint32_t>(e.EndTime);
+            std::string when = std::string(e.DateText) + " " + e.TimeText;
+            if (local)
+                when = TimeText(start, "%Y/%m/%d %H:%M:%S-", Zone::kLocal) + TimeText(end, "%H:%M:%S", Zone::kLocal);
+            std::printf("%d\t%d\t%u\t%u\t%s\n", row, e.Idx, start, end, when.c_str());
         }
         return kOk;
     }
@@ -447,20 +459,23 @@ int main(int argc, char** argv)
         return kOk;
     }
     static const std::map<std::string, std::set<std::string>> kFlags = {
-        {"info", {"--dump", "--json"}}, {"list", {"--json"}}, {"verify", {"--json"}},
-        {"extract", {"--force"}}, {"export", {"--force"}}, {"hash", {}}, {"recover", {"--json"}}, {"report", {"--hash"}},
+        {"info", {"--dump", "--json"}}, {"list", {"--json", "--local"}}, {"verify", {"--json"}},
+        {"extract", {"--force"}}, {"export", {"--force", "--merge", "--local"}}, {"hash", {}},
+        {"recover", {"--json", "--local"}}, {"report", {"--hash"}},
     };
     for (const std::string& flag : line.flags)
         if (!kFlags.at(line.command).count(flag))
             return UsageError("'" + line.command + "' takes no option " + flag);
     if (line.operands.empty())
         return UsageError("'" + line.command + "' needs a disk");
+    if (line.Has("--local"))
+        SetTextZone(Zone::kLocal);
     const std::string& disk = line.operands[0];
     const std::size_t operands = line.operands.size();
     if (line.command == "info" && operands == 1)
         return Info(disk.c_str(), line.Has("--dump"), line.Has("--json"));
     if (line.command == "list" && operands == 1)
-        return List(disk.c_str(), line.Has("--json"));
+        return List(disk.c_str(), line.Has("--json"), line.Has("--local"));
     if (line.command == "verify" && operands == 1)
         return Verify(disk.c_str(), line.Has("--json"));
     if (line.command == "extract" && operands == 2 && line.Value("-o") && !line.Value("--blocks"))
