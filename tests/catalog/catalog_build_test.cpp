@@ -3,6 +3,7 @@
 #include <filesystem>
 #include <fstream>
 #include <functional>
+#include <numeric>
 #include <string>
 #include <vector>
 
@@ -60,26 +61,30 @@ protected:
     std::unique_ptr<DiskImage> image_;
 };
 
-TEST_F(CatalogBuildTest, WrappedSpanIsReadFromTheOldestAroundTheRingToTheNewest)
+// The span from the oldest to the newest, around the end of the ring, of at
+// most 8192 rows.
+TEST_F(CatalogBuildTest, SpanIsReadFromTheOldestAroundTheRingToTheNewest)
 {
-    Layout layout = SmallLayout();
-    layout.listMax = 10;
-    const std::string path = WriteDisk({5, 6, 7, 8, 9, 0, 1, 2}, layout);
-
-    ASSERT_EQ(Build(path), CatalogBuild::kBuilt);
-    EXPECT_EQ(Indices(), (std::vector<int>{5, 6, 7, 8, 9, 0, 1, 2}));
-    EXPECT_EQ(catalog_.m_catalog->SpanCount, 8);
-    EXPECT_EQ(catalog_.m_catalog->Entries[0].StartTime, 5000);
-    EXPECT_EQ(catalog_.m_catalog->Entries[7].EndTime, 2500);
-    EXPECT_EQ(catalog_.m_catalog->Entries[8].Idx, -1);
-}
-
-TEST_F(CatalogBuildTest, SingleRecording)
-{
-    const std::string path = WriteDisk({4});
-    ASSERT_EQ(Build(path), CatalogBuild::kBuilt);
-    EXPECT_EQ(Indices(), (std::vector<int>{4}));
-    EXPECT_EQ(catalog_.m_catalog->SpanCount, 1);
+    std::vector<int> many(9000);
+    std::iota(many.begin(), many.end(), 0);
+    const struct {
+        int listMax;
+        std::vector<int> positions;
+        int rows, spanCount;
+    } cases[] = {{10, {5, 6, 7, 8, 9, 0, 1, 2}, 8, 8}, {16, {4}, 1, 1}, {9000, many, 8192, 9000}};
+    for (const auto& c : cases) {
+        Layout layout = SmallLayout();
+        layout.listMax = c.listMax;
+        ASSERT_EQ(Build(WriteDisk(c.positions, layout, std::to_string(c.listMax) + ".img")), CatalogBuild::kBuilt);
+        const std::vector<int> rows(c.positions.begin(), c.positions.begin() + c.rows);
+        EXPECT_EQ(Indices(), rows);
+        EXPECT_EQ(catalog_.m_catalog->SpanCount, c.spanCount);
+        EXPECT_EQ(catalog_.m_catalog->Entries[0].StartTime, 1000 * c.positions[0]);
+        EXPECT_EQ(catalog_.m_catalog->Entries[c.rows - 1].EndTime, 1000 * c.positions[c.rows - 1] + 500);
+        if (c.rows < 8192) {
+            EXPECT_EQ(catalog_.m_catalog->Entries[c.rows].Idx, -1);
+        }
+    }
 }
 
 struct DamagedListCase {
@@ -90,11 +95,6 @@ struct DamagedListCase {
     std::vector<std::int32_t> skipped;
     int spanCount;
 };
-
-void PrintTo(const DamagedListCase& c, std::ostream* out)
-{
-    *out << c.name;
-}
 
 class DamagedListTest : public CatalogBuildTest, public ::testing::WithParamInterface<DamagedListCase> {};
 
@@ -108,14 +108,12 @@ TEST_P(DamagedListTest, DamagedEntryCostsOnlyItsOwnRow)
     image_ = std::make_unique<DiskImage>(layout);
     for (int i = 0; i < 12; ++i)
         image_->Add(GeneratedRecording(i, i, i, 1000 * i, 1000 * i + 500, 16, 2, 64));
-    const std::string path = WriteImage(*image_);
-    for (int p : GetParam().damagedBoth) {
-        image_->Damage(Target::ListEntry, p);
-        image_->Damage(Target::ListMirror, p);
-    }
+    std::vector<Damage> damage;
+    for (int p : GetParam().damagedBoth)
+        damage.insert(damage.end(), {{Target::ListEntry, p}, {Target::ListMirror, p}});
     for (int p : GetParam().damagedRing)
-        image_->Damage(Target::ListEntry, p);
-    Refingerprint(path);
+        damage.push_back({Target::ListEntry, p});
+    const std::string path = WriteDamaged(*image_, damage);
 
     ASSERT_EQ(Build(path), CatalogBuild::kBuilt);
     EXPECT_EQ(Indices(), GetParam().rows);
@@ -145,17 +143,12 @@ INSTANTIATE_TEST_SUITE_P(
     Lists, DamagedListTest,
     ::testing::Values(DamagedListCase{"ThirdAndSeventh", {2, 6}, {4}, {0, 1, 3, 4, 5, 7, 8, 9, 10, 11}, {2, 6}, 12},
                       DamagedListCase{"OldestAndNewest", {0, 11}, {}, {1, 2, 3, 4, 5, 6, 7, 8, 9, 10}, {0, 11}, 10}),
-    [](const ::testing::TestParamInfo<DamagedListCase>& info) { return std::string(info.param.name); });
+    CaseName<DamagedListCase>);
 
 struct OddAdapterCase {
     const char* name;
     void (*change)(Layout&);
 };
-
-void PrintTo(const OddAdapterCase& c, std::ostream* out)
-{
-    *out << c.name;
-}
 
 class OddAdapterTest : public CatalogBuildTest, public ::testing::WithParamInterface<OddAdapterCase> {};
 
@@ -179,7 +172,7 @@ INSTANTIATE_TEST_SUITE_P(
         OddAdapterCase{"MirrorBeyondTheDisk",
                        [](Layout& l) { l.listOffsetBackup = 40000ull * 4096, l.dataBlockOffset = 1 << 20; }},
         OddAdapterCase{"NewestPositionBeyondTheRing", [](Layout& l) { l.lastListIdx = 16 + 1; }}),
-    [](const ::testing::TestParamInfo<OddAdapterCase>& info) { return std::string(info.param.name); });
+    CaseName<OddAdapterCase>);
 
 TEST_F(CatalogBuildTest, NegativePositionsAreSkippedWithoutAReadAndAHugeSpanIsCutTo16Bits)
 {
@@ -209,21 +202,6 @@ TEST_F(CatalogBuildTest, NewestBelowZeroAndBelowTheOldestCountsAsWrapped)
     EXPECT_EQ(catalog_.m_recordCount, 0);
     EXPECT_EQ(catalog_.m_catalog->SpanCount, 77);
     EXPECT_EQ(catalog_.m_catalog->Entries[0].Idx, -1);
-}
-
-TEST_F(CatalogBuildTest, TakesTheFirst8192OfALongerSpan)
-{
-    Layout layout = SmallLayout();
-    layout.listMax = 9000;
-    std::vector<int> positions;
-    for (int i = 0; i < 9000; ++i)
-        positions.push_back(i);
-    const std::string path = WriteDisk(positions, layout);
-
-    ASSERT_EQ(Build(path), CatalogBuild::kBuilt);
-    EXPECT_EQ(catalog_.m_recordCount, 8192);
-    EXPECT_EQ(catalog_.m_catalog->Entries[8191].Idx, 8191);
-    EXPECT_EQ(catalog_.m_catalog->SpanCount, 9000);
 }
 
 TEST_F(CatalogBuildTest, TextsAreUtcDateAndClockTimes)
@@ -282,11 +260,6 @@ struct SummaryCase {
     std::function<std::string(const std::string& dir)> makeDisk;  // writes a disk, returns its path
     std::string summary;
 };
-
-void PrintTo(const SummaryCase& c, std::ostream* out)
-{
-    *out << c.name;
-}
 
 std::string Written(DiskImage image, const std::string& path, const std::vector<std::pair<Target, int>>& damage)
 {
@@ -358,6 +331,6 @@ INSTANTIATE_TEST_SUITE_P(
                     },
                     "not a recorder disk (the image is empty)"},
         SummaryCase{"Directory", [](const std::string& d) { return d; }, "cannot read: Is a directory"}),
-    [](const ::testing::TestParamInfo<SummaryCase>& info) { return std::string(info.param.name); });
+    CaseName<SummaryCase>);
 
 }  // namespace

@@ -17,13 +17,9 @@ using dvrimage::Target;
 struct SearchCase {
     const char* name;
     std::vector<SlotRun> runs;
-    int chosen;
+    int chosen;  // -1: none
+    std::size_t reads = 0;  // slot reads of the search; 0: not checked
 };
-
-void PrintTo(const SearchCase& c, std::ostream* out)
-{
-    *out << c.name;
-}
 
 class AdapterSearchTest : public DiskTest, public ::testing::WithParamInterface<SearchCase> {};
 
@@ -33,42 +29,36 @@ TEST_P(AdapterSearchTest, ChoosesTheEndOfTheFirstRunOfValidSlots)
     layout.adapterRuns = GetParam().runs;
     DiskImage image(layout);
     const std::string path = WriteImage(image);
+    ASSERT_EQ(Open(path), 1);
+    iotrace::Reset();
 
-    ASSERT_EQ(OpenAndSearch(path), 1);
-    EXPECT_EQ(Adapter().Idx, GetParam().chosen);
-    EXPECT_EQ(reader_.m_errorCode, 0);
+    const bool found = GetParam().chosen >= 0;
+    ASSERT_EQ(reader_.BlockOpe(reader_.m_diskFile, 2, nullptr, 0, 0), found ? 1 : -1);
+    if (GetParam().reads > 0) {
+        EXPECT_EQ(iotrace::Reads(path).size(), GetParam().reads);
+    }
+    if (found) {
+        EXPECT_EQ(Adapter().Idx, GetParam().chosen);
+        EXPECT_EQ(reader_.m_errorCode, 0);
+    } else {
+        EXPECT_EQ(reader_.m_errorCode, 36);
+        EXPECT_EQ(reader_.m_volume->adapter, nullptr);
+    }
 }
 
 INSTANTIATE_TEST_SUITE_P(
     Runs, AdapterSearchTest,
     ::testing::Values(SearchCase{"FromSlotZero", {{0, 50}}, 49},
                       SearchCase{"AcrossTheEndOfTheRing", {{70, 60}}, 9},
-                      SearchCase{"AllSlots", {{0, 120}}, 119},
+                      SearchCase{"AllSlotsInAtMost241Reads", {{0, 120}}, 119, 241},
                       SearchCase{"TwoRuns", {{5, 5}, {20, 10}}, 9},
-                      SearchCase{"OnlyTheLastSlot", {{119, 1}}, 119}),
-    [](const ::testing::TestParamInfo<SearchCase>& info) { return std::string(info.param.name); });
+                      SearchCase{"OnlyTheLastSlot", {{119, 1}}, 119},
+                      // Slot 0, slot 1, slot 0 again; no recordings, so no list read.
+                      SearchCase{"OnlySlotZeroNeedsNoListRead", {{0, 1}}, 0, 3},
+                      SearchCase{"NoneValid", {}, -1}),
+    CaseName<SearchCase>);
 
 class AdapterTest : public DiskTest {};
-
-TEST_F(AdapterTest, SearchReadsAtMost241SlotsAndFailsWhenNoneIsValid)
-{
-    Layout all = SmallLayout();
-    all.adapterRuns = {{0, 120}};
-    DiskImage full(all);
-    const std::string fullPath = WriteImage(full, "full.img");
-    ASSERT_EQ(Open(fullPath), 1);
-    iotrace::Reset();
-    ASSERT_EQ(reader_.BlockOpe(reader_.m_diskFile, 2, nullptr, 0, 0), 1);
-    EXPECT_EQ(iotrace::Reads(fullPath).size(), 241u);
-
-    Layout none = SmallLayout();
-    none.adapterRuns.clear();
-    DiskImage empty(none);
-    const std::string emptyPath = WriteImage(empty, "empty.img");
-    EXPECT_EQ(OpenAndSearch(emptyPath), -1);
-    EXPECT_EQ(reader_.m_errorCode, 36);
-    EXPECT_EQ(reader_.m_volume->adapter, nullptr);
-}
 
 TEST_F(AdapterTest, SlotWithAZeroSumButAnotherNumberEndsTheRun)
 {
@@ -79,7 +69,6 @@ TEST_F(AdapterTest, SlotWithAZeroSumButAnotherNumberEndsTheRun)
     const std::vector<char> zeros(512);
     image.WriteLogical(5 * 4096, zeros.data(), zeros.size());  // XOR 0, Idx 0
     Refingerprint(path);
-
     ASSERT_EQ(OpenAndSearch(path), 1);
     EXPECT_EQ(Adapter().Idx, 4);
 }
@@ -90,60 +79,26 @@ TEST_F(AdapterTest, ChosenSlotThatChangesWhenReadAgainIsRefused)
     const std::string path = WriteImage(image);
     ASSERT_EQ(Open(path), 1);
     iotrace::CorruptReads(path, (1 << 20) + 100, 2);  // slot 0 arrives changed on its second read
-
     EXPECT_EQ(reader_.BlockOpe(reader_.m_diskFile, 2, nullptr, 0, 0), -1);
     EXPECT_EQ(reader_.m_errorCode, 81);
     EXPECT_EQ(ErrorText(), "FUNCTION[1241]");
     EXPECT_EQ(reader_.m_volume->adapter, nullptr);
 }
 
-TEST_F(AdapterTest, VolumeWithoutRecordingsNeedsNoListRead)
+TEST_F(AdapterTest, AdapterWhoseRingsAreLargerThanAnyRecordersIsRefused)
 {
-    DiskImage image(SmallLayout());
-    const std::string path = WriteImage(image);
-    ASSERT_EQ(Open(path), 1);
-    iotrace::Reset();
-    ASSERT_EQ(reader_.BlockOpe(reader_.m_diskFile, 2, nullptr, 0, 0), 1);
-    EXPECT_EQ(Adapter().LastList.Idx, -1);
-    EXPECT_EQ(iotrace::Reads(path).size(), 3u);  // slot 0, slot 1, slot 0 again
+    Layout list = SmallLayout();
+    list.listMax = (1 << 20) + 1, list.blockCount = 1 << 30, list.imageSize = 1 << 30;
+    Layout data = SmallLayout();
+    data.dataBlockMax = (1 << 22) + 1, data.blockCount = INT_MAX, data.blockSizeShift = 20, data.imageSize = 1 << 30;
+    for (const Layout& layout : {list, data}) {
+        DiskImage image(layout);
+        EXPECT_EQ(OpenAndSearch(WriteImage(image, std::to_string(layout.listMax) + ".img")), -1);
+        EXPECT_EQ(reader_.m_errorCode, 82);
+        EXPECT_EQ(ErrorText(), "FUNCTION[1250]");
+        EXPECT_EQ(reader_.m_volume->adapter, nullptr);
+    }
 }
-
-struct RingCase {
-    const char* name;
-    void (*change)(Layout&);
-};
-
-void PrintTo(const RingCase& c, std::ostream* out)
-{
-    *out << c.name;
-}
-
-class AdapterRingsTest : public DiskTest, public ::testing::WithParamInterface<RingCase> {};
-
-TEST_P(AdapterRingsTest, AdapterWhoseRingsAreLargerThanAnyRecordersIsRefused)
-{
-    Layout layout = SmallLayout();
-    GetParam().change(layout);
-    DiskImage image(layout);
-    const std::string path = WriteImage(image);
-
-    EXPECT_EQ(OpenAndSearch(path), -1);
-    EXPECT_EQ(reader_.m_errorCode, 82);
-    EXPECT_EQ(ErrorText(), "FUNCTION[1250]");
-    EXPECT_EQ(reader_.m_volume->adapter, nullptr);
-}
-
-INSTANTIATE_TEST_SUITE_P(
-    Rings, AdapterRingsTest,
-    ::testing::Values(
-        RingCase{"ListRingTooLarge",
-                 [](Layout& l) { l.listMax = (1 << 20) + 1, l.blockCount = 1 << 30, l.imageSize = 1 << 30; }},
-        RingCase{"DataRingTooLarge",
-                 [](Layout& l) {
-                     l.dataBlockMax = (1 << 22) + 1, l.blockCount = INT_MAX, l.blockSizeShift = 20;
-                     l.imageSize = 1 << 30;
-                 }}),
-    [](const ::testing::TestParamInfo<RingCase>& info) { return std::string(info.param.name); });
 
 TEST_F(AdapterTest, EmptyRingsAreAcceptedAndNothingDividesByThem)
 {
@@ -153,22 +108,18 @@ TEST_F(AdapterTest, EmptyRingsAreAcceptedAndNothingDividesByThem)
     layout.firstListIdx = 3;
     layout.lastListIdx = 2;  // claims recordings in a ring of none
     DiskImage image(layout);
-    const std::string path = WriteImage(image);
-
-    EXPECT_EQ(OpenAndSearch(path), -1);  // the refresh cannot read an entry of an empty ring
-    EXPECT_EQ(reader_.m_errorCode, 65);  // and so finds no oldest entry to read
+    EXPECT_EQ(OpenAndSearch(WriteImage(image)), -1);  // the refresh cannot read an entry of an empty ring
+    EXPECT_EQ(reader_.m_errorCode, 65);               // and so finds no oldest entry to read
     ASSERT_NE(reader_.m_volume->adapter, nullptr);
     _HisiHeader_t header{};
     std::vector<unsigned char> payload(16);
     reader_.m_streamBlock = 5;
-    EXPECT_EQ(reader_.get_stream(reader_.m_diskFile, payload.data(), &header, Adapter().FirstList,
-                                 Adapter().LastList, 1),
-              -1);
-    EXPECT_EQ(reader_.m_errorCode, 70);
-    EXPECT_EQ(reader_.get_stream(reader_.m_diskFile, payload.data(), &header, Adapter().FirstList,
-                                 Adapter().LastList, 0),
-              -1);
-    EXPECT_EQ(reader_.m_errorCode, 65);
+    for (const auto& [direction, code] : {std::pair{1, 70}, std::pair{0, 65}}) {
+        EXPECT_EQ(reader_.get_stream(reader_.m_diskFile, payload.data(), &header, Adapter().FirstList,
+                                     Adapter().LastList, direction),
+                  -1);
+        EXPECT_EQ(reader_.m_errorCode, code);
+    }
 }
 
 // Positions repeat around the ring: the span is walked one turn, and the
@@ -183,7 +134,6 @@ TEST_F(AdapterTest, ListSpanLongerThanTheRingIsWalkedOneTurn)
     for (int i = 0; i < 3; ++i)
         image.Add(GeneratedRecording(i, i, i, 100 * (i + 1), 100 * (i + 1) + 50, 8));
     const std::string path = WriteImage(image);
-
     ASSERT_EQ(OpenAndSearch(path), 1);
     EXPECT_EQ(Adapter().FirstList.Idx, 0);
     EXPECT_EQ(Adapter().LastList.Idx, 2);
@@ -193,126 +143,105 @@ TEST_F(AdapterTest, ListSpanLongerThanTheRingIsWalkedOneTurn)
     EXPECT_LE(iotrace::Reads(path).size(), 2u * 16 + 4);  // both copies of one turn, a few records
 }
 
-TEST_F(AdapterTest, RefreshTakesTheEarliestStartAndLatestEndOfTheReadableEntries)
+struct Listed {
+    int position, block;
+    std::uint32_t start, end;
+};
+
+struct RefreshCase {
+    const char* name;
+    std::vector<Listed> recordings;
+    std::vector<std::int32_t> damagedInBothCopies;
+    int result;
+    std::int32_t code;
+    int oldest, newest, newestBlock;
+    std::uint32_t start, end;
+};
+
+class RefreshTest : public DiskTest, public ::testing::WithParamInterface<RefreshCase> {};
+
+// The refresh takes the oldest and newest readable entries of the span, the
+// earliest start and latest end among the readable ones, and names the
+// positions it could not read.
+TEST_P(RefreshTest, SpanRunsFromTheOldestToTheNewestReadableEntry)
 {
+    const RefreshCase& c = GetParam();
     Layout layout = SmallLayout();
     layout.startTime = 5;  // a stale summary that the refresh replaces
     layout.endTime = 6;
     DiskImage image(layout);
-    image.Add(GeneratedRecording(0, 0, 0, 300, 400, 8));
-    image.Add(GeneratedRecording(1, 1, 1, 100, 900, 8));
-    image.Add(GeneratedRecording(2, 2, 2, 200, 500, 8));
-    const std::string path = WriteImage(image);
+    for (const Listed& r : c.recordings)
+        image.Add(GeneratedRecording(r.position, r.block, r.block, r.start, r.end, 8));
+    std::vector<Damage> damage;
+    for (std::int32_t position : c.damagedInBothCopies)
+        damage.insert(damage.end(), {{Target::ListEntry, position}, {Target::ListMirror, position}});
 
-    ASSERT_EQ(OpenAndSearch(path), 1);
-    EXPECT_EQ(Adapter().StartTime, 100u);
-    EXPECT_EQ(Adapter().EndTime, 900u);
-    EXPECT_EQ(Adapter().FirstList.Idx, 0);
-    EXPECT_EQ(Adapter().LastList.Idx, 2);
+    EXPECT_EQ(OpenAndSearch(WriteDamaged(image, damage)), c.result);
+    EXPECT_EQ(reader_.m_errorCode, c.code);
+    ASSERT_NE(reader_.m_volume->adapter, nullptr);  // installed before the refresh
+    if (c.result < 0)
+        return;
+    EXPECT_EQ(Adapter().FirstList.Idx, c.oldest);
+    EXPECT_EQ(Adapter().LastList.Idx, c.newest);
+    EXPECT_EQ(Adapter().LastList.EndBlock, c.newestBlock);  // the entry itself, read again from the disk
+    EXPECT_EQ(Adapter().CurBlockHeader.BlockIdx, c.newestBlock);
+    EXPECT_EQ(Adapter().StartTime, c.start);
+    EXPECT_EQ(Adapter().EndTime, c.end);
+    EXPECT_EQ(reader_.m_volume->unreadableListPositions, c.damagedInBothCopies);
 }
 
-TEST_F(AdapterTest, RefreshPassesOverUnreadableEntriesFromTheOldestToTheNewestReadable)
-{
-    Layout layout = SmallLayout();
-    DiskImage image(layout);
-    for (int i = 0; i < 6; ++i)
-        image.Add(GeneratedRecording(i, i, i, 100 * (i + 1), 100 * (i + 1) + 50, 8));
-    const std::string path = WriteImage(image);
-    for (int damaged : {0, 2, 5}) {
-        image.Damage(Target::ListEntry, damaged);
-        image.Damage(Target::ListMirror, damaged);
-    }
-    Refingerprint(path);
+INSTANTIATE_TEST_SUITE_P(
+    Spans, RefreshTest,
+    ::testing::Values(
+        RefreshCase{"EarliestStartLatestEnd", {{0, 0, 300, 400}, {1, 1, 100, 900}, {2, 2, 200, 500}}, {}, 1, 0, 0, 2,
+                    2, 100, 900},
+        RefreshCase{"PassesOverUnreadableEntries",
+                    {{0, 0, 100, 150}, {1, 1, 200, 250}, {2, 2, 300, 350}, {3, 3, 400, 450}, {4, 4, 500, 550},
+                     {5, 5, 600, 650}},
+                    {0, 2, 5}, 1, 50, 1, 4, 4, 200, 550},
+        RefreshCase{"AcrossTheEndOfTheListRing",
+                    {{14, 0, 1000, 1050}, {15, 1, 1100, 1150}, {0, 2, 1200, 1250}, {1, 3, 1300, 1350}},
+                    {1}, 1, 50, 14, 0, 2, 1000, 1250},
+        // The oldest readable entry is none: position -1.
+        RefreshCase{"NoReadableEntry", {{0, 0, 100, 200}}, {0}, -1, 65, 0, 0, 0, 0, 0}),
+    CaseName<RefreshCase>);
 
-    ASSERT_EQ(OpenAndSearch(path), 1);
-    EXPECT_EQ(Adapter().FirstList.Idx, 1);
-    EXPECT_EQ(Adapter().LastList.Idx, 4);
-    EXPECT_EQ(Adapter().LastList.EndBlock, 4);  // the entry itself, read again from the disk
-    EXPECT_EQ(Adapter().StartTime, 200u);
-    EXPECT_EQ(Adapter().EndTime, 550u);
-    EXPECT_EQ(Adapter().CurBlockHeader.BlockIdx, 4);
-    EXPECT_EQ(reader_.m_volume->unreadableListPositions, (std::vector<std::int32_t>{0, 2, 5}));
-    EXPECT_EQ(reader_.m_errorCode, 50);  // left by the damaged entries on the way
-}
-
-TEST_F(AdapterTest, RefreshWalksAListSpanAcrossTheEndOfTheListRing)
-{
-    DiskImage image(SmallLayout());  // a list ring of 16 entries
-    const int positions[] = {14, 15, 0, 1};
-    for (int i = 0; i < 4; ++i)
-        image.Add(GeneratedRecording(positions[i], i, i, 1000 + 100 * i, 1050 + 100 * i, 8));
-    const std::string path = WriteImage(image);
-    image.Damage(Target::ListEntry, 1);
-    image.Damage(Target::ListMirror, 1);
-    Refingerprint(path);
-
-    ASSERT_EQ(OpenAndSearch(path), 1);
-    EXPECT_EQ(Adapter().FirstList.Idx, 14);
-    EXPECT_EQ(Adapter().LastList.Idx, 0);
-    EXPECT_EQ(Adapter().LastList.EndBlock, 2);
-    EXPECT_EQ(Adapter().StartTime, 1000u);
-    EXPECT_EQ(Adapter().EndTime, 1250u);
-}
-
-TEST_F(AdapterTest, RefreshWithoutAnyReadableEntryFails)
-{
-    DiskImage image(SmallLayout());
-    image.Add(GeneratedRecording(0, 0, 0, 100, 200, 8));
-    const std::string path = WriteImage(image);
-    image.Damage(Target::ListEntry, 0);
-    image.Damage(Target::ListMirror, 0);
-    Refingerprint(path);
-
-    EXPECT_EQ(OpenAndSearch(path), -1);
-    EXPECT_EQ(reader_.m_errorCode, 65);  // the oldest readable entry is none: position -1
-    EXPECT_NE(reader_.m_volume->adapter, nullptr);  // installed before the refresh
-}
-
-class NewestHeaderTest : public DiskTest {
-protected:
-    // The newest recording runs from block 190 across the end of a ring of
-    // 200 blocks to block 5.
-    std::string WriteWrappedDisk(const std::vector<int>& damagedHeaders)
-    {
-        Layout layout = SmallLayout();
-        layout.dataBlockMax = 200;
-        image_ = std::make_unique<DiskImage>(layout);
-        image_->Add(GeneratedRecording(0, 100, 110, 1000, 2000, 200, 1, 64));
-        image_->Add(GeneratedRecording(1, 190, 5, 3000, 4000, 200, 1, 64));
-        const std::string path = WriteImage(*image_);
-        for (int block : damagedHeaders)
-            image_->Damage(Target::BlockHeader, block);
-        Refingerprint(path);
-        return path;
-    }
-    std::unique_ptr<DiskImage> image_;
+struct NewestHeaderCase {
+    const char* name;
+    std::vector<int> damagedHeaders;
+    int result;
+    int newestBlock;
 };
 
-TEST_F(NewestHeaderTest, DamagedLastHeaderIsReplacedByTheNewestReadableOne)
+class NewestHeaderTest : public DiskTest, public ::testing::WithParamInterface<NewestHeaderCase> {};
+
+// The newest recording runs from block 190 across the end of a ring of 200
+// blocks to block 5; a damaged last header gives way to the newest readable one.
+TEST_P(NewestHeaderTest, DamagedLastHeaderIsReplacedByTheNewestReadableOne)
 {
-    ASSERT_EQ(OpenAndSearch(WriteWrappedDisk({5, 4, 3})), 1);
-    EXPECT_EQ(Adapter().LastList.EndBlock, 2);
-    EXPECT_EQ(Adapter().CurBlockHeader.BlockIdx, 2);
+    Layout layout = SmallLayout();
+    layout.dataBlockMax = 200;
+    DiskImage image(layout);
+    image.Add(GeneratedRecording(0, 100, 110, 1000, 2000, 200, 1, 64));
+    image.Add(GeneratedRecording(1, 190, 5, 3000, 4000, 200, 1, 64));
+    std::vector<Damage> damage;
+    for (int block : GetParam().damagedHeaders)
+        damage.push_back({Target::BlockHeader, block});
+    ASSERT_EQ(OpenAndSearch(WriteDamaged(image, damage)), GetParam().result);
     EXPECT_EQ(reader_.m_errorCode, 52);
+    if (GetParam().result > 0) {
+        EXPECT_EQ(Adapter().LastList.EndBlock, GetParam().newestBlock);
+        EXPECT_EQ(Adapter().CurBlockHeader.BlockIdx, GetParam().newestBlock);
+    }
 }
 
-TEST_F(NewestHeaderTest, BackwardSearchCrossesTheStartOfTheRing)
-{
-    ASSERT_EQ(OpenAndSearch(WriteWrappedDisk({5, 4, 3, 2, 1, 0})), 1);
-    EXPECT_EQ(Adapter().LastList.EndBlock, 199);
-    EXPECT_EQ(Adapter().CurBlockHeader.BlockIdx, 199);
-}
-
-TEST_F(NewestHeaderTest, NoReadableHeaderInTheRecordingFailsTheRefresh)
-{
-    std::vector<int> all;
-    for (int b = 190; b < 200; ++b)
-        all.push_back(b);
-    for (int b = 0; b <= 5; ++b)
-        all.push_back(b);
-    EXPECT_EQ(OpenAndSearch(WriteWrappedDisk(all)), -1);
-    EXPECT_EQ(reader_.m_errorCode, 52);
-}
+INSTANTIATE_TEST_SUITE_P(
+    Headers, NewestHeaderTest,
+    ::testing::Values(NewestHeaderCase{"ThreeDamaged", {5, 4, 3}, 1, 2},
+                      NewestHeaderCase{"BackAcrossTheStartOfTheRing", {5, 4, 3, 2, 1, 0}, 1, 199},
+                      NewestHeaderCase{"NoneReadable",
+                                       {190, 191, 192, 193, 194, 195, 196, 197, 198, 199, 0, 1, 2, 3, 4, 5}, -1, 0}),
+    CaseName<NewestHeaderCase>);
 
 TEST_F(AdapterTest, BackwardHeaderSearchTriesEachBlockOfTheRingOnlyOnce)
 {
@@ -330,25 +259,31 @@ TEST_F(AdapterTest, BackwardHeaderSearchTriesEachBlockOfTheRingOnlyOnce)
     Refingerprint(path);
     ASSERT_EQ(Open(path), 1);
     iotrace::Reset();
-
     EXPECT_EQ(reader_.BlockOpe(reader_.m_diskFile, 2, nullptr, 0, 0), -1);
     EXPECT_EQ(reader_.m_errorCode, 52);
     EXPECT_LT(iotrace::Reads(path).size(), 250u);
 }
 
-TEST_F(AdapterTest, DamagedNewestIndexEntryShortensTheNewestBlock)
+TEST_F(AdapterTest, NewestFrameIsTheLastReadableIndexEntryThatFits)
 {
-    DiskImage image(SmallLayout());
-    image.Add(GeneratedRecording(0, 0, 1, 100, 200, 8, 3, 1000));
-    const std::string path = WriteImage(image);
-    image.Damage(Target::IndexEntry, 1, 2);
-    Refingerprint(path);
-
-    ASSERT_EQ(OpenAndSearch(path), 1);
+    DiskImage damaged(SmallLayout());
+    damaged.Add(GeneratedRecording(0, 0, 1, 100, 200, 8, 3, 1000));
+    ASSERT_EQ(OpenAndSearch(WriteDamaged(damaged, {{Target::IndexEntry, 1, 2}}, "damaged.img")), 1);
     EXPECT_EQ(Adapter().CurBlockHeader.FrameCount, 2);
     EXPECT_EQ(Adapter().LastFrame.DataOffset, 1000);
     EXPECT_EQ(Adapter().LastFrame.DataSize, 1000);
     EXPECT_EQ(reader_.m_errorCode, 53);
+
+    // A header claiming 2^31 - 1 frames is walked down from the last entry a block can hold.
+    DiskImage huge(SmallLayout());
+    huge.Add(GeneratedRecording(0, 0, 0, 100, 200, 8, 3, 100));
+    const std::string path = WriteImage(huge, "huge.img");
+    const dvrimage::BlockHeaderBytes header = huge.MakeBlockHeader(0, INT_MAX);
+    huge.WriteLogical(huge.DataBlockOffset(), header.data(), header.size());
+    Refingerprint(path);
+    ASSERT_EQ(OpenAndSearch(path), 1);
+    EXPECT_EQ(Adapter().CurBlockHeader.FrameCount, 3);
+    EXPECT_EQ(Adapter().LastFrame.DataOffset, 200);
 }
 
 TEST_F(AdapterTest, NoReadableIndexEntryFailsUnlessTheAdapterRecordsNoFrame)
@@ -358,26 +293,10 @@ TEST_F(AdapterTest, NoReadableIndexEntryFailsUnlessTheAdapterRecordsNoFrame)
         layout.adapterRecordsFrame = recordsFrame;
         DiskImage image(layout);
         image.Add(GeneratedRecording(0, 0, 1, 100, 200, 8, 2, 100));
-        const std::string path = WriteImage(image, recordsFrame ? "frame.img" : "noframe.img");
-        image.Damage(Target::IndexEntry, 1, 0);
-        image.Damage(Target::IndexEntry, 1, 1);
-        Refingerprint(path);
+        const std::string path = WriteDamaged(image, {{Target::IndexEntry, 1, 0}, {Target::IndexEntry, 1, 1}},
+                                              recordsFrame ? "frame.img" : "noframe.img");
         EXPECT_EQ(OpenAndSearch(path), recordsFrame ? -1 : 1);
     }
-}
-
-TEST_F(AdapterTest, HugeFrameCountIsWalkedDownFromTheLastEntryThatFits)
-{
-    DiskImage image(SmallLayout());
-    image.Add(GeneratedRecording(0, 0, 0, 100, 200, 8, 3, 100));
-    const std::string path = WriteImage(image);
-    const dvrimage::BlockHeaderBytes header = image.MakeBlockHeader(0, INT_MAX);
-    image.WriteLogical(image.DataBlockOffset(), header.data(), header.size());
-    Refingerprint(path);
-
-    ASSERT_EQ(OpenAndSearch(path), 1);
-    EXPECT_EQ(Adapter().CurBlockHeader.FrameCount, 3);
-    EXPECT_EQ(Adapter().LastFrame.DataOffset, 200);
 }
 
 TEST_F(AdapterTest, DumpPrintsTheAdapterInFourLines)
@@ -386,17 +305,14 @@ TEST_F(AdapterTest, DumpPrintsTheAdapterInFourLines)
     layout.timeStampBase = 77;
     DiskImage image(layout);
     image.Add(GeneratedRecording(0, 0, 0, 3661, 90061, 8));
-    const std::string path = WriteImage(image);
-    ASSERT_EQ(OpenAndSearch(path), 1);
-
+    ASSERT_EQ(OpenAndSearch(WriteImage(image)), 1);
     ::testing::internal::CaptureStdout();
     EXPECT_EQ(reader_.BlockOpe(reader_.m_diskFile, 5, nullptr, 0, 0), 1);
-    const std::string dump = ::testing::internal::GetCapturedStdout();
-    EXPECT_EQ(dump, "\tAdapter: Version=1, TimeStamp=77, Idx=0, Magic=0x48444152\n"
-                    "\tList: Offset=491520, OffsetBackup=495616, Max=16\n"
-                    "\tDataBlock: Offset=499712, Max=8\n"
-                    "\tStartTime=1:1:1(3661), EndTime=1:1:1(90061)\n");
-
+    EXPECT_EQ(::testing::internal::GetCapturedStdout(),
+              "\tAdapter: Version=1, TimeStamp=77, Idx=0, Magic=0x48444152\n"
+              "\tList: Offset=491520, OffsetBackup=495616, Max=16\n"
+              "\tDataBlock: Offset=499712, Max=8\n"
+              "\tStartTime=1:1:1(3661), EndTime=1:1:1(90061)\n");
     reader_.CloseDVRFS();
     EXPECT_EQ(reader_.BlockOpe(nullptr, 5, nullptr, 0, 0), -1);
     EXPECT_EQ(reader_.BlockOpe(nullptr, 7, nullptr, 0, 0), 1);  // no such operation: nothing happens

@@ -97,6 +97,16 @@ std::string DiskTest::WriteImage(dvrimage::DiskImage& image, const std::string& 
     return path;
 }
 
+std::string DiskTest::WriteDamaged(dvrimage::DiskImage& image, const std::vector<Damage>& damage,
+                                   const std::string& name)
+{
+    const std::string path = WriteImage(image, name);
+    for (const Damage& d : damage)
+        image.Damage(d.target, d.a, d.b);
+    Refingerprint(path);
+    return path;
+}
+
 void DiskTest::Refingerprint(const std::string& path)
 {
     fingerprints_[path] = FileFingerprint(path);

@@ -9,6 +9,7 @@
 #include <cstdint>
 #include <map>
 #include <string>
+#include <vector>
 
 #include "dvrfs/dvr_disk_reader.h"
 #include "tools/dvrimage/dvr_image.h"
@@ -25,6 +26,20 @@ void PatchSuperBlocks(dvrimage::DiskImage& image, const std::string& path, std::
 // A small, valid geometry: 4096-byte blocks, 16 list entries, 8 data blocks.
 dvrimage::Layout SmallLayout();
 
+// Table-driven tests: a case's `name` names its test.
+template <typename Case>
+std::string CaseName(const ::testing::TestParamInfo<Case>& info)
+{
+    return info.param.name;
+}
+
+// Damage to write into an image: a target and its place (see DiskImage::Damage).
+struct Damage {
+    dvrimage::Target target;
+    std::int64_t a = 0;
+    std::int64_t b = 0;
+};
+
 class DiskTest : public ::testing::Test {
 protected:
     void SetUp() override;
@@ -33,6 +48,9 @@ protected:
     // Writes the image into this test's folder and remembers its fingerprint
     // (call again after damaging it).
     std::string WriteImage(dvrimage::DiskImage& image, const std::string& name = "disk.img");
+    // Writes the image, then damages it.
+    std::string WriteDamaged(dvrimage::DiskImage& image, const std::vector<Damage>& damage,
+                             const std::string& name = "disk.img");
     void Refingerprint(const std::string& path);
 
     // Opens the image with reader_ and runs what a catalogue build runs
