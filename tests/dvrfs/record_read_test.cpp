@@ -2,6 +2,7 @@
 // entries and payloads, each with its bounds and XOR-sum checks.
 #include <climits>
 #include <cstring>
+#include <functional>
 #include <vector>
 
 #include "tests/support/disk_fixture.h"
@@ -61,107 +62,101 @@ protected:
     std::string path_;
 };
 
-TEST_F(RecordReadTest, ListReadDeliversEntriesWithinTheRing)
+TEST_F(RecordReadTest, RecordsAreDeliveredFromTheirRingsAndPlaces)
 {
     Search();
-    _HisiList_t entries[3];
-    ASSERT_EQ(ReadList(0, 3, entries), 1);
-    EXPECT_EQ(entries[0].Idx, 0);
-    EXPECT_EQ(entries[1].StartBlock, 2);
-    EXPECT_EQ(entries[2].EndTime, 600u);
-    ASSERT_EQ(ReadList(15, 1, entries), 1);
-    EXPECT_EQ(entries[0].Idx, 15);
-
-    EXPECT_EQ(ReadList(16, 1, entries), -1);
-    ExpectError(66, "FUNCTION[1445]");
-    EXPECT_EQ(ReadList(14, 3, entries), -1);
-    ExpectError(66, "FUNCTION[1445]");
-    EXPECT_EQ(ReadList(-1, 1, entries), -1);
-    ExpectError(65, "FUNCTION[1438]");
-    EXPECT_EQ(ReadList(3, 1, entries), -1);  // never written: fails its sum in the ring and the mirror
-    ExpectError(50, "FUNCTION[1463]");
-}
-
-TEST_F(RecordReadTest, DamagedRingCopyIsRepairedFromTheMirrorAndCode50Stays)
-{
-    image_->Damage(Target::ListEntry, 1);
-    Refingerprint(path_);
-    Search();
-    iotrace::Reset();
-
-    _HisiList_t entries[3];
-    ASSERT_EQ(ReadList(0, 3, entries), 1);
-    EXPECT_EQ(entries[1].Idx, 1);
-    EXPECT_EQ(entries[1].StartBlock, 2);
-    EXPECT_EQ(reader_.Checksum(reinterpret_cast<char*>(&entries[1]), 128), 0x5A);
-    ExpectError(50, "FUNCTION[1463]");
-    // One read of the three entries in the ring, one of entry 1 in the mirror.
-    const std::vector<iotrace::ReadCall> reads = iotrace::Reads(path_);
-    ASSERT_EQ(reads.size(), 2u);
-    EXPECT_EQ(reads[1].offset, static_cast<std::int64_t>(image_->PhysicalOffset(image_->ListOffsetBackup())));
-}
-
-TEST_F(RecordReadTest, EntryDamagedInBothCopiesFails)
-{
-    image_->Damage(Target::ListEntry, 2);
-    image_->Damage(Target::ListMirror, 2);
-    Refingerprint(path_);
-    Search();
-    _HisiList_t entry;
-    EXPECT_EQ(ReadList(2, 1, &entry), -1);
-    ExpectError(50, "FUNCTION[1463]");
-}
-
-TEST_F(RecordReadTest, DamagedMirrorAloneIsNeverRead)
-{
-    image_->Damage(Target::ListMirror, 0);
-    Refingerprint(path_);
-    Search();
-    _HisiList_t entry;
-    EXPECT_EQ(ReadList(0, 1, &entry), 1);
-    EXPECT_EQ(reader_.m_errorCode, 0);
-}
-
-TEST_F(RecordReadTest, HeaderReadStaysInsideTheDataRing)
-{
-    Search();
+    _HisiList_t list[3];
+    ASSERT_EQ(ReadList(0, 3, list), 1);
+    EXPECT_EQ(list[0].Idx, 0);
+    EXPECT_EQ(list[1].StartBlock, 2);
+    EXPECT_EQ(list[2].EndTime, 600u);
+    ASSERT_EQ(ReadList(15, 1, list), 1);
+    EXPECT_EQ(list[0].Idx, 15);
     _HisiBlockHeader_t headers[2];
     ASSERT_EQ(ReadHeaders(6, 2, headers), 1);
     EXPECT_EQ(headers[0].BlockIdx, 6);
     EXPECT_EQ(headers[1].BlockIdx, 7);
     EXPECT_EQ(headers[1].FrameCount, 3);
-
-    EXPECT_EQ(ReadHeaders(8, 1, headers), -1);
-    ExpectError(70, "FUNCTION[1583]");
-    EXPECT_EQ(ReadHeaders(INT64_MAX, 1, headers), -1);
-    ExpectError(70, "FUNCTION[1583]");
-    EXPECT_EQ(ReadHeaders(-1, 1, headers), -1);
-    ExpectError(69, "FUNCTION[1576]");
-
-    image_->Damage(Target::BlockHeader, 3);
-    EXPECT_EQ(ReadHeaders(3, 1, headers), -1);
-    ExpectError(52, "FUNCTION[1600]");
-    Refingerprint(path_);
+    // Index entries come newest first from the end of the block.
+    _HisiHeader_t index[3];
+    ASSERT_EQ(ReadIndex(4, 0, 3, index), 1);
+    EXPECT_EQ(index[0].DataOffset, 2000);
+    EXPECT_EQ(index[1].DataOffset, 1000);
+    EXPECT_EQ(index[2].DataOffset, 0);
+    EXPECT_EQ(index[2].DataSize, 1000);
+    std::vector<unsigned char> payload(1000);
+    ASSERT_EQ(ReadPayload(5, 1000, 1000, payload.data()), 1);
+    EXPECT_EQ(payload, dvrimage::PatternPayload(5, 1, 1000));
+    EXPECT_EQ(ReadPayload(5, 16777000, 88, payload.data()), 1);  // the end of the payload area
 }
 
-TEST_F(RecordReadTest, IndexEntriesComeNewestFirstFromTheEndOfTheBlock)
+TEST_F(RecordReadTest, ReadsOutsideTheirRingOrAreaAreRefusedWithCodeAndText)
 {
     Search();
-    _HisiHeader_t entries[3];
-    ASSERT_EQ(ReadIndex(4, 0, 3, entries), 1);
-    EXPECT_EQ(entries[0].DataOffset, 2000);
-    EXPECT_EQ(entries[1].DataOffset, 1000);
-    EXPECT_EQ(entries[2].DataOffset, 0);
-    EXPECT_EQ(entries[2].DataSize, 1000);
+    char b[3 * 128];
+    const struct {
+        const char* what;
+        std::function<int()> read;
+        std::int32_t code;
+        const char* text;
+    } refused[] = {
+        {"list entry past the ring", [&] { return ReadList(16, 1, b); }, 66, "FUNCTION[1445]"},
+        {"list entries across the end", [&] { return ReadList(14, 3, b); }, 66, "FUNCTION[1445]"},
+        {"negative list entry", [&] { return ReadList(-1, 1, b); }, 65, "FUNCTION[1438]"},
+        // Never written: it fails its sum in the ring and the mirror.
+        {"unwritten list entry", [&] { return ReadList(3, 1, b); }, 50, "FUNCTION[1463]"},
+        {"header past the ring", [&] { return ReadHeaders(8, 1, b); }, 70, "FUNCTION[1583]"},
+        {"header far past the ring", [&] { return ReadHeaders(INT64_MAX, 1, b); }, 70, "FUNCTION[1583]"},
+        {"negative header", [&] { return ReadHeaders(-1, 1, b); }, 69, "FUNCTION[1576]"},
+        {"negative index entry", [&] { return ReadIndex(4, -1, 1, b); }, 71, "FUNCTION[1623]"},
+        {"index entry past the block", [&] { return ReadIndex(4, 262142, 1, b); }, 72, "FUNCTION[1630]"},
+        {"payload past the area", [&] { return ReadPayload(5, 16777000, 89, b); }, 74, "FUNCTION[1666]"},
+        {"negative payload length", [&] { return ReadPayload(5, 10, -20, b); }, 74, "FUNCTION[1666]"},
+        {"payload overflowing", [&] { return ReadPayload(5, INT_MAX, INT_MAX, b); }, 74, "FUNCTION[1666]"},
+        {"negative payload offset", [&] { return ReadPayload(5, -1, 10, b); }, 73, "FUNCTION[1661]"},
+    };
+    for (const auto& r : refused) {
+        EXPECT_EQ(r.read(), -1) << r.what;
+        EXPECT_EQ(reader_.m_errorCode, r.code) << r.what;
+        EXPECT_EQ(ErrorText(), r.text) << r.what;
+    }
+}
 
-    EXPECT_EQ(ReadIndex(4, -1, 1, entries), -1);
-    ExpectError(71, "FUNCTION[1623]");
-    EXPECT_EQ(ReadIndex(4, 262142, 1, entries), -1);
-    ExpectError(72, "FUNCTION[1630]");
-    image_->Damage(Target::IndexEntry, 4, 1);
-    EXPECT_EQ(ReadIndex(4, 0, 3, entries), -1);
-    ExpectError(53, "FUNCTION[1649]");
+// Entry 1 damaged in the ring is repaired from the mirror (code 50 stays);
+// entry 2 damaged in both copies fails; entry 0 damaged in the mirror alone
+// is never read there.
+TEST_F(RecordReadTest, DamagedRecordsAreRepairedFromTheMirrorOrRefused)
+{
+    for (const Damage& d : std::vector<Damage>{{Target::ListEntry, 1}, {Target::ListEntry, 2},
+                                               {Target::ListMirror, 2}, {Target::ListMirror, 0}})
+        image_->Damage(d.target, d.a);
     Refingerprint(path_);
+    Search();
+    _HisiList_t entries[2];
+    EXPECT_EQ(ReadList(0, 1, entries), 1);
+    EXPECT_EQ(reader_.m_errorCode, 0);
+    iotrace::Reset();
+    ASSERT_EQ(ReadList(0, 2, entries), 1);
+    EXPECT_EQ(entries[1].Idx, 1);
+    EXPECT_EQ(entries[1].StartBlock, 2);
+    EXPECT_EQ(reader_.Checksum(reinterpret_cast<char*>(&entries[1]), 128), 0x5A);
+    ExpectError(50, "FUNCTION[1463]");
+    // One read of the entries in the ring, one of entry 1 in the mirror.
+    const std::vector<iotrace::ReadCall> reads = iotrace::Reads(path_);
+    ASSERT_EQ(reads.size(), 2u);
+    EXPECT_EQ(reads[1].offset, static_cast<std::int64_t>(image_->PhysicalOffset(image_->ListOffsetBackup())));
+    reader_.m_errorCode = 0;
+    EXPECT_EQ(ReadList(2, 1, entries), -1);
+    ExpectError(50, "FUNCTION[1463]");
+
+    image_->Damage(Target::BlockHeader, 3);
+    image_->Damage(Target::IndexEntry, 4, 1);
+    Refingerprint(path_);
+    _HisiHeader_t index[3];
+    EXPECT_EQ(ReadHeaders(3, 1, index), -1);
+    ExpectError(52, "FUNCTION[1600]");
+    EXPECT_EQ(ReadIndex(4, 0, 3, index), -1);
+    ExpectError(53, "FUNCTION[1649]");
 }
 
 TEST_F(RecordReadTest, LastIndexEntryLiesDirectlyAfterTheHeader)
@@ -180,24 +175,6 @@ TEST_F(RecordReadTest, LastIndexEntryLiesDirectlyAfterTheHeader)
     ASSERT_EQ(reads.size(), 1u);
     EXPECT_EQ(reads[0].offset, static_cast<std::int64_t>(image_->PhysicalOffset(image_->DataBlockOffset() +
                                                                                   4 * (1 << 24))));
-}
-
-TEST_F(RecordReadTest, PayloadReadStaysInsideThePayloadArea)
-{
-    Search();
-    std::vector<unsigned char> payload(1000);
-    ASSERT_EQ(ReadPayload(5, 1000, 1000, payload.data()), 1);
-    EXPECT_EQ(payload, dvrimage::PatternPayload(5, 1, 1000));
-
-    EXPECT_EQ(ReadPayload(5, 16777000, 88, payload.data()), 1);
-    EXPECT_EQ(ReadPayload(5, 16777000, 89, payload.data()), -1);
-    ExpectError(74, "FUNCTION[1666]");
-    EXPECT_EQ(ReadPayload(5, 10, -20, payload.data()), -1);
-    ExpectError(74, "FUNCTION[1666]");
-    EXPECT_EQ(ReadPayload(5, INT_MAX, INT_MAX, payload.data()), -1);
-    ExpectError(74, "FUNCTION[1666]");
-    EXPECT_EQ(ReadPayload(5, -1, 10, payload.data()), -1);
-    ExpectError(73, "FUNCTION[1661]");
 }
 
 // A read refused before the device is asked (here: a data block the adapter
