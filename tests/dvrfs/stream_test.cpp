@@ -61,7 +61,9 @@ protected:
 
 using Frames = std::vector<std::pair<int, int>>;
 
-TEST_F(StreamTest, ForwardDeliversEachFrameThenMovesToTheNextBlock)
+// Forward: each frame, then the next block's first; backward: entry 0, then
+// the previous block's last entry.
+TEST_F(StreamTest, EachFrameThenTheNextOrPreviousBlock)
 {
     Write(SmallLayout(), {GeneratedRecording(0, 0, 1, 100, 200, 8, 3, kFrameSize)});
     Search();
@@ -72,6 +74,11 @@ TEST_F(StreamTest, ForwardDeliversEachFrameThenMovesToTheNextBlock)
     EXPECT_EQ(got, (Frames{{0, 0}, {0, 1}, {0, 2}, {1, 0}}));
     EXPECT_EQ(reader_.m_streamBlock, 1);
     EXPECT_EQ(reader_.m_streamFrame, 1);
+    Place(1, 0);
+    EXPECT_EQ(Backward(), std::make_pair(1, 0));
+    EXPECT_EQ(reader_.m_streamFrame, -1);
+    EXPECT_EQ(Backward(), std::make_pair(0, 2));
+    EXPECT_EQ(Backward(), std::make_pair(0, 1));
 }
 
 TEST_F(StreamTest, ForwardPassesOverABlockWithoutFrames)
@@ -105,17 +112,6 @@ TEST_F(StreamTest, ForwardRunsAcrossTheEndOfTheRingThenRestartsAtTheOldestRecord
     expected.push_back({10, 0});  // past the range: the oldest recording's first block
     EXPECT_EQ(got, expected);
     EXPECT_EQ(reader_.m_streamBlock, 10);
-}
-
-TEST_F(StreamTest, BackwardDeliversEntryZeroThenThePreviousBlocksLastEntry)
-{
-    Write(SmallLayout(), {GeneratedRecording(0, 0, 1, 100, 200, 8, 3, kFrameSize)});
-    Search();
-    Place(1, 0);
-    EXPECT_EQ(Backward(), std::make_pair(1, 0));
-    EXPECT_EQ(reader_.m_streamFrame, -1);
-    EXPECT_EQ(Backward(), std::make_pair(0, 2));
-    EXPECT_EQ(Backward(), std::make_pair(0, 1));
 }
 
 TEST_F(StreamTest, BackwardBeforeTheOldestRecordingRestartsAtTheEndOfTheNewest)

@@ -69,16 +69,17 @@ TEST_F(PlaybackTest, FirstPlayConnectsAndStartsADecoderForTheAnsweredChannels)
     ASSERT_EQ(connects.size(), 1u);
     EXPECT_EQ(connects[0].id, iEVT_MORVANE_WINDOW);
     EXPECT_EQ(connects[0].record, 1u);
-    EXPECT_EQ(connects[0].mode, 0);
     EXPECT_NE(panel_->m_decoder, nullptr);
     EXPECT_EQ(*panel_->m_decoder->m_filePath, panel_->m_diskPath);
-    EXPECT_EQ(panel_->m_decoder->m_dvrId, panel_->m_panelId);
     EXPECT_EQ(CanvasCalls(), (std::vector<K>{K::kReset, K::kOn}));
     EXPECT_EQ(panel_->m_glPane->Calls()[1].address, 0x7F000001u);
     EXPECT_EQ(CSoundout::Get()->Routes(), (std::vector<std::pair<int, int>>{{0, 0}}));
     EXPECT_EQ(panel_->m_connAddress, "127.0.0.1");
-    EXPECT_EQ(panel_->m_connRecord, 1);
     EXPECT_EQ(panel_->m_playState, 0);
+
+    panel_->m_catalog->Entries[0].Idx = 70000;  // the record number is the low 16 bits of the list index
+    panel_->SendMorvaneCommand(0);
+    EXPECT_EQ(Events(iEVT_HDD_CONNECTED)[1].record, 70000u & 0xFFFF);
 }
 
 TEST_F(PlaybackTest, SecondPlayTakesDownTheFirstChannelByChannel)
@@ -93,7 +94,6 @@ TEST_F(PlaybackTest, SecondPlayTakesDownTheFirstChannelByChannel)
     EXPECT_EQ(history[0].type, iEVT_HDD_DISCONNECTED);
     EXPECT_EQ(history[0].address, "127.0.0.1");
     EXPECT_EQ(history[0].record, 0u);
-    EXPECT_EQ(history[0].panelId, panel_->m_panelId);
     EXPECT_EQ(history[1].type, iEVT_HDD_CONNECTED);
     const std::vector<FrameManager::Call>& calls = FrameManager::Get()->Calls();
     ASSERT_EQ(calls.size(), 8u);
@@ -103,7 +103,6 @@ TEST_F(PlaybackTest, SecondPlayTakesDownTheFirstChannelByChannel)
         EXPECT_EQ(calls[2 * channel].channel, channel);
         EXPECT_EQ(calls[2 * channel].operation, 2);
         EXPECT_EQ(calls[2 * channel].address, static_cast<std::uint32_t>(inet_addr("127.0.0.1")));
-        EXPECT_EQ(calls[2 * channel + 1].panelId, panel_->m_panelId);
     }
     EXPECT_EQ(CanvasCalls(), (std::vector<K>{K::kReset, K::kOn, K::kOff, K::kReset, K::kOn}));
     EXPECT_EQ(panel_->m_glPane->Calls()[2].count, 4);
@@ -116,19 +115,11 @@ TEST_F(PlaybackTest, MoreThan32ChannelsStartNothingButAreCleanedUpNextTime)
     EXPECT_EQ(panel_->m_decoder, nullptr);
     EXPECT_TRUE(panel_->m_glPane->Calls().empty());
     EXPECT_TRUE(CSoundout::Get()->Routes().empty());
-    EXPECT_EQ(panel_->m_channelCount, 33);
     EXPECT_EQ(panel_->m_playState, 0);
     g_channels = 1;
     panel_->SendMorvaneCommand(1);
     EXPECT_EQ(FrameManager::Get()->Calls().size(), 66u);
     EXPECT_TRUE(Events(iEVT_HDD_DISCONNECTED).empty());  // no decoder to take down
-}
-
-TEST_F(PlaybackTest, RecordNumberIsTheLow16BitsOfTheListIndex)
-{
-    panel_->m_catalog->Entries[0].Idx = 70000;
-    panel_->SendMorvaneCommand(0);
-    EXPECT_EQ(Events(iEVT_HDD_CONNECTED)[0].record, 70000u & 0xFFFF);
 }
 
 TEST_F(PlaybackTest, ForwardAndReverseKeepTheirOwnSteps)
@@ -154,7 +145,6 @@ TEST_F(PlaybackTest, ForwardAndReverseKeepTheirOwnSteps)
     const HostEventRecord command = Events(iEVT_HDD_COMMAND)[0];
     EXPECT_EQ(command.mode, 2);
     EXPECT_EQ(command.id, iEVT_MORVANE_WINDOW);
-    EXPECT_EQ(command.panelId, panel_->m_panelId);
 }
 
 TEST_F(PlaybackTest, PlayRestartsOnlyWhenStopped)
@@ -197,7 +187,6 @@ TEST_F(PlaybackTest, SwitchToFilePlayHandsOverOnceAndFindsNoCanvasTheSecondTime)
     const std::vector<HostEventRecord> history = EventManager::Get()->History();
     ASSERT_EQ(history.size(), 2u);
     EXPECT_EQ(history[0].type, iEVT_HDD_DISCONNECTED);
-    EXPECT_EQ(history[0].id, 0);
     EXPECT_EQ(history[1].type, QRIX_START_FILEPLAY);
     EXPECT_EQ(panel_->m_glPane, nullptr);
     EXPECT_FALSE(panel_->m_dialog->IsShown());
@@ -207,6 +196,15 @@ TEST_F(PlaybackTest, SwitchToFilePlayHandsOverOnceAndFindsNoCanvasTheSecondTime)
     EXPECT_EQ(Events(QRIX_START_FILEPLAY).size(), 2u);
     wxSizeEvent resize(wxSize(1024, 768));
     panel_->OnSize(resize);  // a layout without a canvas
+}
+
+TEST_F(PlaybackTest, DeletingDuringPlaybackDisconnectsWithoutClosingAll)
+{
+    panel_->SendMorvaneCommand(1);
+    EventManager::Get()->ClearHistory();
+    plugin_->OnRelease(false);
+    EXPECT_EQ(Events(iEVT_REMOTE_DISCONNECTED).size(), 1u);
+    EXPECT_TRUE(Events(QRIX_CLOSE_ALL).empty());
 }
 
 TEST_F(PlaybackTest, ClosingDuringPlaybackDisconnectsOnceAndSwitchesTheChannelsOff)
@@ -219,7 +217,6 @@ TEST_F(PlaybackTest, ClosingDuringPlaybackDisconnectsOnceAndSwitchesTheChannelsO
     const std::vector<HostEventRecord> history = EventManager::Get()->History();
     ASSERT_EQ(history.size(), 2u);
     EXPECT_EQ(history[0].type, iEVT_REMOTE_DISCONNECTED);
-    EXPECT_EQ(history[0].kind, HostEventRecord::kConnectEvent);
     EXPECT_EQ(history[0].address, "127.0.0.1");
     EXPECT_EQ(history[0].record, 1u);
     EXPECT_EQ(history[0].panelId, panel_->m_panelId);
@@ -230,15 +227,6 @@ TEST_F(PlaybackTest, ClosingDuringPlaybackDisconnectsOnceAndSwitchesTheChannelsO
     EventManager::Get()->ClearHistory();
     plugin_->OnRelease(false);  // deleting the closed panel: no second disconnect
     EXPECT_TRUE(EventManager::Get()->History().empty());
-}
-
-TEST_F(PlaybackTest, DeletingDuringPlaybackDisconnectsWithoutClosingAll)
-{
-    panel_->SendMorvaneCommand(1);
-    EventManager::Get()->ClearHistory();
-    plugin_->OnRelease(false);
-    EXPECT_EQ(Events(iEVT_REMOTE_DISCONNECTED).size(), 1u);
-    EXPECT_TRUE(Events(QRIX_CLOSE_ALL).empty());
 }
 
 }  // namespace
