@@ -251,10 +251,6 @@ TEST_F(CatalogBuildTest, SecondBuildReplacesTheFirstAndAFailedOneEmptiesIt)
     EXPECT_EQ(Indices(), (std::vector<int>{}));
 }
 
-}  // namespace
-
-namespace {
-
 struct SummaryCase {
     const char* name;
     std::function<std::string(const std::string& dir)> makeDisk;  // writes a disk, returns its path

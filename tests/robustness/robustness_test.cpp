@@ -38,7 +38,6 @@ TEST_F(RobustnessTest, ReadOnlyImageIsOnlyEverOpenedForReadingAndKeepsItsBytes)
     image.Add(GeneratedRecording(1, 6, 0, 300, 400, 8));
     const std::string path = WriteImage(image);
     ASSERT_EQ(::chmod(path.c_str(), 0444), 0);
-    const std::string before = FileFingerprint(path);
 
     ASSERT_EQ(Build(path), CatalogBuild::kBuilt);
     CatalogReader verifier;
@@ -48,12 +47,7 @@ TEST_F(RobustnessTest, ReadOnlyImageIsOnlyEverOpenedForReadingAndKeepsItsBytes)
     const dvrfstool::ExtractResult extracted =
         dvrfstool::ExtractRecording(catalog_, recording, [](const dvrfstool::ExtractedFrame&) { return true; });
     EXPECT_EQ(extracted.frames, 9);
-
-    EXPECT_EQ(FileFingerprint(path), before);
-    const std::vector<iotrace::OpenCall> opens = iotrace::Opens(path);
-    ASSERT_GE(opens.size(), 2u);
-    for (const iotrace::OpenCall& call : opens)
-        EXPECT_EQ(call.flags & O_ACCMODE, O_RDONLY);
+    EXPECT_GE(iotrace::Opens(path).size(), 2u);  // each open read-only, the bytes unchanged: checked after every test
 }
 
 // The worst list the writer can make: a ring of the largest size the reader

@@ -76,11 +76,6 @@ struct FramesCase {
     long long skipped;
 };
 
-void PrintTo(const FramesCase& c, std::ostream* out)
-{
-    *out << c.name;
-}
-
 class FramesTest : public DiskCheckTest, public ::testing::WithParamInterface<FramesCase> {};
 
 // What one block gives, whatever its index entries claim: never a byte
@@ -134,7 +129,7 @@ INSTANTIATE_TEST_SUITE_P(
         FramesCase{"EachTheWholeArea", 0x5A, {{0, kArea}, {0, kArea}, {0, kArea}, {0, kArea}}, 4, 1, kArea, 3},
         // Unwritten entries read as zeros, which pass where the record sum is 0.
         FramesCase{"ThousandEmptyFrames", 0x00, {}, 1000, 1000, 100, 0}),
-    [](const ::testing::TestParamInfo<FramesCase>& info) { return std::string(info.param.name); });
+    CaseName<FramesCase>);
 
 TEST_F(DiskCheckTest, VerificationReportsTheLyingHeader)
 {
@@ -146,10 +141,6 @@ TEST_F(DiskCheckTest, VerificationReportsTheLyingHeader)
     EXPECT_EQ(lines, (std::vector<std::string>{"damaged: data block 1 header (frame count 2147483647)"}));
     EXPECT_EQ(result.damaged, 1);
 }
-
-}  // namespace
-
-namespace {
 
 // A recorder's disk after its list ring wrapped: two older recordings whose
 // entries were written over keep their blocks (0 to 1, and 2), a third
@@ -172,10 +163,8 @@ TEST_F(DiskCheckTest, RecoverFindsTheBlocksTheIndexLost)
     image_->Add(GeneratedRecording(1, 5, 6, 4000, 4060, 12, 3, 100));
     image_->Add(GeneratedRecording(2, 7, 7, 5000, 5060, 12, 3, 100));
     image_->Add(GeneratedRecording(3, 8, 8, 6000, 6060, 12, 3, 100));
-    const std::string path = WriteImage(*image_);
-    image_->Damage(dvrimage::Target::ListEntry, 2);
-    image_->Damage(dvrimage::Target::ListMirror, 2);
-    Refingerprint(path);
+    const std::string path =
+        WriteDamaged(*image_, {{dvrimage::Target::ListEntry, 2}, {dvrimage::Target::ListMirror, 2}});
     ASSERT_EQ(catalog_.BuildCatalog(wxString::FromUTF8(path.c_str())), CatalogBuild::kBuilt);
 
     iotrace::Reset();

@@ -52,11 +52,6 @@ struct ExportCase {
     const char* creationTime;
 };
 
-void PrintTo(const ExportCase& c, std::ostream* out)
-{
-    *out << c.name;
-}
-
 class ExportTest : public DiskTest, public ::testing::WithParamInterface<ExportCase> {};
 
 // Recording 1 holds blocks 2 to 5: 100 frames (key frame every 25) over 4 s.
@@ -101,7 +96,7 @@ INSTANTIATE_TEST_SUITE_P(
         // The damaged block's second is left out; the file keeps its place in time.
         ExportCase{"DamagedBlockLeftOut", dvrfstool::ExportFormat::kMp4, {}, {}, 3, 75, 4.0,
                    "2023-11-14T23:13:20.000000Z"}),
-    [](const ::testing::TestParamInfo<ExportCase>& info) { return std::string(info.param.name); });
+    CaseName<ExportCase>);
 
 // Both recordings in one file on one timeline: rows 0 (2 s) and 1 (4 s, an
 // hour later) keep their frames and the hour between them.
