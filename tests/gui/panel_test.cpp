@@ -58,40 +58,35 @@ TEST_F(PanelTest, DialogAndWidgetsAreBuiltAsSpecifiedAndShown)
     EXPECT_EQ(p->GetBitmapBaseName(), "MorvanePlugin");
 }
 
-TEST_F(PanelTest, UpTo600PixelsHighTheLayoutIsFixed)
+// Up to 600 pixels high the layout is fixed; above, the canvas grows and the
+// transport buttons follow its width (the switch button stays); the canvas
+// keeps at least one pixel.
+TEST_F(PanelTest, LayoutFollowsTheDialogSize)
 {
     MorvanePlugConfig* p = OpenPanel();
-    Resize(p, 1600, 600);
-    EXPECT_EQ(Bounds(p->m_recordList), wxRect(10, 70, 180, 490));
-    EXPECT_EQ(Bounds(p->m_glPane), wxRect(200, 10, 585, 500));
-    EXPECT_EQ(Bounds(p->m_btnPlay), wxRect(395, 530, 30, 30));
-    EXPECT_EQ(Bounds(p->m_btnForward), wxRect(555, 530, 30, 30));
-    EXPECT_EQ(Bounds(p->m_btnSwitch), wxRect(750, 530, 30, 30));
-}
-
-TEST_F(PanelTest, Above600PixelsTheButtonRowFollowsTheCanvasWidth)
-{
-    MorvanePlugConfig* p = OpenPanel();
-    Resize(p, 1024, 768);
-    EXPECT_EQ(Bounds(p->m_recordList), wxRect(10, 70, 180, 658));
-    EXPECT_EQ(Bounds(p->m_glPane), wxRect(200, 10, 809, 668));
-    EXPECT_EQ(p->m_glPane->getWidth(), 809);
-    std::vector<int> xs;
-    for (wxBitmapButton* b : {p->m_btnPlay, p->m_btnPause, p->m_btnStop, p->m_btnReverse, p->m_btnForward}) {
-        xs.push_back(b->GetPosition().x);
-        EXPECT_EQ(b->GetPosition().y, 698);
+    const struct {
+        wxSize dialog;
+        wxRect list, canvas;
+        std::vector<int> buttonXs;
+        int buttonY;
+    } layouts[] = {
+        {{1600, 600}, {10, 70, 180, 490}, {200, 10, 585, 500}, {395, 435, 475, 515, 555}, 530},
+        {{1024, 768}, {10, 70, 180, 658}, {200, 10, 809, 668}, {485, 535, 586, 636, 687}, 698},
+        {{1024, 601}, {10, 70, 180, 491}, {200, 10, 809, 501}, {485, 535, 586, 636, 687}, 531},
+    };
+    for (const auto& l : layouts) {
+        Resize(p, l.dialog.x, l.dialog.y);
+        EXPECT_EQ(Bounds(p->m_recordList), l.list) << l.dialog.x << "x" << l.dialog.y;
+        EXPECT_EQ(Bounds(p->m_glPane), l.canvas);
+        EXPECT_EQ(p->m_glPane->getWidth(), l.canvas.width);
+        std::vector<int> xs;
+        for (wxBitmapButton* b : {p->m_btnPlay, p->m_btnPause, p->m_btnStop, p->m_btnReverse, p->m_btnForward}) {
+            xs.push_back(b->GetPosition().x);
+            EXPECT_EQ(b->GetPosition().y, l.buttonY);
+        }
+        EXPECT_EQ(xs, l.buttonXs);
+        EXPECT_EQ(Bounds(p->m_btnSwitch), wxRect(750, 530, 30, 30));
     }
-    EXPECT_EQ(xs, (std::vector<int>{485, 535, 586, 636, 687}));
-    EXPECT_EQ(p->m_btnSwitch->GetPosition(), wxPoint(750, 530));
-
-    Resize(p, 1024, 601);
-    EXPECT_EQ(Bounds(p->m_glPane), wxRect(200, 10, 809, 501));
-    EXPECT_EQ(p->m_btnPlay->GetPosition(), wxPoint(384 + 101, 531));
-}
-
-TEST_F(PanelTest, NarrowDialogKeepsACanvasOfAtLeastOnePixel)
-{
-    MorvanePlugConfig* p = OpenPanel();
     Resize(p, 100, 700);
     EXPECT_EQ(p->m_glPane->GetSize(), wxSize(1, 600));
     Resize(p, 215, 601);
@@ -145,9 +140,14 @@ TEST_F(PanelTest, ReleaseThenDestructionDeletesThePanelOnce)
     EXPECT_EQ(EventManager::Get()->SinkCount(iEVT_TIMER_UPDATED), 0u);
 }
 
-TEST_F(PanelTest, TimerTickRefreshesTheCanvasOnlyOfAShownPanel)
+TEST_F(PanelTest, CanvasPaintsThroughThePanelAndTicksRefreshOnlyAShownOne)
 {
     MorvanePlugConfig* p = OpenPanel();
+    const int before = p->m_glPane->Renders();
+    p->m_glPane->Refresh();
+    p->m_glPane->Update();
+    gui::Pump(100);
+    EXPECT_GT(p->m_glPane->Renders(), before);
     QrixEvent tick(iEVT_TIMER_UPDATED);
     EventManager::Get()->ProcessEvent(tick);
     EXPECT_EQ(p->m_glPane->TextureUpdates(), 1);
@@ -158,14 +158,5 @@ TEST_F(PanelTest, TimerTickRefreshesTheCanvasOnlyOfAShownPanel)
     EventManager::Get()->ProcessEvent(tick);  // no panel: nothing to refresh
 }
 
-TEST_F(PanelTest, CanvasPaintsThroughThePanel)
-{
-    MorvanePlugConfig* p = OpenPanel();
-    const int before = p->m_glPane->Renders();
-    p->m_glPane->Refresh();
-    p->m_glPane->Update();
-    gui::Pump(100);
-    EXPECT_GT(p->m_glPane->Renders(), before);
-}
 
 }  // namespace
