@@ -19,11 +19,10 @@ using dvrimage::GeneratedRecording;
 using dvrimage::Layout;
 using dvrimage::Target;
 
-struct Seed {
-    const char* name;
-    std::function<Layout()> layout;
-    std::function<void(DiskImage&)> recordings;
-    std::function<void(DiskImage&)> damage;
+struct Hit {
+    Target target;
+    std::int64_t a = 0;
+    std::int64_t b = 0;
 };
 
 Layout Small(int shift = 12)
@@ -43,7 +42,19 @@ void ThreeRecordings(DiskImage& image)
     image.Add(GeneratedRecording(2, 6, 0, 500, 600, 8, 2, 16));  // wraps the data ring
 }
 
-void None(DiskImage&) {}
+struct Seed {
+    const char* name;
+    std::vector<Hit> damage = {};
+    std::function<void(DiskImage&)> recordings = ThreeRecordings;
+    Layout layout = Small();
+};
+
+Layout With(void (*change)(Layout&))
+{
+    Layout l = Small();
+    change(l);
+    return l;
+}
 
 }  // namespace
 
@@ -56,79 +67,34 @@ int main(int argc, char** argv)
     const std::filesystem::path out = argv[1];
     std::filesystem::create_directories(out);
     const std::string scratch = "/dev/shm/morvane-seed-" + std::to_string(::getpid()) + ".img";
+    const auto none = [](DiskImage&) {};
     const std::vector<Seed> seeds = {
-        {"valid-4k", [] { return Small(); }, ThreeRecordings, None},
-        {"valid-512", [] { return Small(9); }, ThreeRecordings, None},
-        {"valid-64k", [] { return Small(16); }, ThreeRecordings, None},
-        {"empty", [] { return Small(); }, None, None},
-        {"list-wraps",
-         [] { return Small(); },
+        {"valid-4k"},
+        {"valid-512", {}, ThreeRecordings, Small(9)},
+        {"valid-64k", {}, ThreeRecordings, Small(16)},
+        {"empty", {}, none},
+        {"list-wraps", {},
          [](DiskImage& i) {
              for (int p : {14, 15, 0, 1})
                  i.Add(GeneratedRecording(p, p % 8, p % 8, 100u * p, 100u * p + 50, 8, 1, 16));
-         },
-         None},
-        {"adapter-run-wraps",
-         [] {
-             Layout l = Small();
-             l.adapterRuns = {{110, 20}};
-             return l;
-         },
-         ThreeRecordings, None},
-        {"no-frame",
-         [] {
-             Layout l = Small();
-             l.adapterRecordsFrame = false;
-             return l;
-         },
-         ThreeRecordings, None},
-        {"primary-super", [] { return Small(); }, ThreeRecordings, [](DiskImage& i) { i.Damage(Target::PrimarySuperBlock); }},
-        {"backup-super", [] { return Small(); }, ThreeRecordings, [](DiskImage& i) { i.Damage(Target::BackupSuperBlock); }},
-        {"primary-table", [] { return Small(); }, ThreeRecordings, [](DiskImage& i) { i.Damage(Target::PrimaryBlockTable); }},
-        {"backup-table", [] { return Small(); }, ThreeRecordings, [](DiskImage& i) { i.Damage(Target::BackupBlockTable); }},
-        {"adapter-slot", [] { return Small(); }, ThreeRecordings, [](DiskImage& i) { i.Damage(Target::AdapterSlot, 0); }},
-        {"list-entry", [] { return Small(); }, ThreeRecordings, [](DiskImage& i) { i.Damage(Target::ListEntry, 1); }},
-        {"list-both",
-         [] { return Small(); },
-         ThreeRecordings,
-         [](DiskImage& i) {
-             i.Damage(Target::ListEntry, 1);
-             i.Damage(Target::ListMirror, 1);
          }},
+        {"adapter-run-wraps", {}, ThreeRecordings, With([](Layout& l) { l.adapterRuns = {{110, 20}}; })},
+        {"no-frame", {}, ThreeRecordings, With([](Layout& l) { l.adapterRecordsFrame = false; })},
+        {"primary-super", {{Target::PrimarySuperBlock}}},
+        {"backup-super", {{Target::BackupSuperBlock}}},
+        {"primary-table", {{Target::PrimaryBlockTable}}},
+        {"backup-table", {{Target::BackupBlockTable}}},
+        {"adapter-slot", {{Target::AdapterSlot, 0}}},
+        {"list-entry", {{Target::ListEntry, 1}}},
+        {"list-both", {{Target::ListEntry, 1}, {Target::ListMirror, 1}}},
         {"list-oldest-and-newest-both",
-         [] { return Small(); },
-         ThreeRecordings,
-         [](DiskImage& i) {
-             for (int p : {0, 2}) {
-                 i.Damage(Target::ListEntry, p);
-                 i.Damage(Target::ListMirror, p);
-             }
-         }},
-        {"span-past-the-ring",
-         [] {
-             Layout l = Small();
-             l.lastListIdx = 16 + 2;
-             return l;
-         },
-         ThreeRecordings, None},
-        {"mirror-beyond-the-disk",
-         [] {
-             Layout l = Small();
-             l.blockCount = 40000;
-             l.listOffsetBackup = 40000ull * 4096;
-             l.dataBlockOffset = 1 << 20;
-             return l;
-         },
-         ThreeRecordings, [](DiskImage& i) { i.Damage(Target::ListEntry, 1); }},
-        {"both-supers",
-         [] { return Small(); },
-         ThreeRecordings,
-         [](DiskImage& i) {
-             i.Damage(Target::PrimarySuperBlock);
-             i.Damage(Target::BackupSuperBlock);
-         }},
-        {"clip-h264",
-         [] { return Small(); },
+         {{Target::ListEntry, 0}, {Target::ListMirror, 0}, {Target::ListEntry, 2}, {Target::ListMirror, 2}}},
+        {"span-past-the-ring", {}, ThreeRecordings, With([](Layout& l) { l.lastListIdx = 16 + 2; })},
+        {"mirror-beyond-the-disk", {{Target::ListEntry, 1}}, ThreeRecordings, With([](Layout& l) {
+             l.blockCount = 40000, l.listOffsetBackup = 40000ull * 4096, l.dataBlockOffset = 1 << 20;
+         })},
+        {"both-supers", {{Target::PrimarySuperBlock}, {Target::BackupSuperBlock}}},
+        {"clip-h264", {},
          [](DiskImage& i) {
              const std::vector<std::vector<std::uint8_t>> units =
                  dvrimage::AccessUnitsOfFile(MORVANE_SOURCE_DIR "/samples/clip.h264");
@@ -139,25 +105,23 @@ int main(int argc, char** argv)
                      recording.blocks[0].push_back({units[static_cast<std::size_t>(k)], 1});
                  i.Add(recording);
              }
-         },
-         None},
-        {"list-wrapped-over",
-         [] { return Small(); },
+         }},
+        {"list-wrapped-over", {},
          [](DiskImage& i) {
              dvrimage::Recording old = GeneratedRecording(0, 0, 1, 100, 200, 8, 2, 16);
              old.listed = false;
              i.Add(old);
              i.Add(GeneratedRecording(0, 2, 3, 300, 400, 8, 2, 16));
-         },
-         None},
-        {"block-header", [] { return Small(); }, ThreeRecordings, [](DiskImage& i) { i.Damage(Target::BlockHeader, 0); }},
-        {"index-entry", [] { return Small(); }, ThreeRecordings, [](DiskImage& i) { i.Damage(Target::IndexEntry, 0, 1); }},
+         }},
+        {"block-header", {{Target::BlockHeader, 0}}},
+        {"index-entry", {{Target::IndexEntry, 0, 1}}},
     };
     for (const Seed& seed : seeds) {
-        DiskImage image(seed.layout());
+        DiskImage image(seed.layout);
         seed.recordings(image);
         image.Write(scratch);
-        seed.damage(image);
+        for (const Hit& hit : seed.damage)
+            image.Damage(hit.target, hit.a, hit.b);
         const std::vector<std::uint8_t> extents = fuzzdisk::ReadExtents(scratch);
         std::ofstream(out / seed.name, std::ios::binary)
             .write(reinterpret_cast<const char*>(extents.data()), static_cast<std::streamsize>(extents.size()));
