@@ -141,42 +141,39 @@ TEST_F(BlockReadTest, SplitsAReadAtBlockBoundariesIntoSectorAlignedPieces)
     EXPECT_EQ(iotrace::Reads(path).size(), 3u);
 }
 
-TEST_F(BlockReadTest, RefusesReadsBeyondTheLastBlockWithTheirPosition)
+// Reads beyond the last block or with unusable arguments are refused with
+// their code before any device read, the destination untouched.
+TEST_F(BlockReadTest, RefusesReadsOutsideTheBlockSpaceOrWithUnusableArguments)
 {
     dvrimage::Layout layout = SmallLayout();
     layout.blockCount = 1000;
-    OpenSmallDisk(layout);
-    char got[2];
-
-    EXPECT_EQ(reader_.BlockRead(reader_.m_diskFile, 4095999, got, 1), 1);
-    EXPECT_EQ(reader_.BlockRead(reader_.m_diskFile, 4095999, got, 2), -1);
-    EXPECT_EQ(reader_.m_errorCode, 37);
-    EXPECT_EQ(ErrorText(), "FUNCTION[1150]Pos=4095999, Size=2, OffsetAddressSpace=0, OffsetBlockSpace=1048576");
-
-    EXPECT_EQ(reader_.BlockRead(reader_.m_diskFile, INT64_MAX - 1, got, 2), -1);  // the end overflows
-    EXPECT_EQ(reader_.m_errorCode, 37);
-    EXPECT_EQ(reader_.BlockRead(reader_.m_diskFile, 0x1000000000000, got, 2), -1);  // beyond 32-bit block numbers
-    EXPECT_EQ(reader_.m_errorCode, 37);
-}
-
-TEST_F(BlockReadTest, RefusesNegativeOrUnusableArguments)
-{
-    const std::string path = OpenSmallDisk();
+    const std::string path = OpenSmallDisk(layout);
     char got[4] = {'x', 'y', 'z', 'w'};
-    iotrace::Reset();
-
+    EXPECT_EQ(reader_.BlockRead(reader_.m_diskFile, 4095999, got, 1), 1);
     EXPECT_EQ(reader_.BlockRead(reader_.m_diskFile, 0, got, 0), 1);
-    EXPECT_EQ(reader_.BlockRead(reader_.m_diskFile, -1, got, 1), -1);
-    EXPECT_EQ(reader_.m_errorCode, 36);
-    EXPECT_EQ(ErrorText(), "FUNCTION[1141]");
-    reader_.m_errorCode = 0;
-    EXPECT_EQ(reader_.BlockRead(reader_.m_diskFile, 0, got, -1), -1);
-    EXPECT_EQ(reader_.m_errorCode, 36);
-    reader_.m_errorCode = 0;
-    EXPECT_EQ(reader_.BlockRead(reader_.m_diskFile, 0, nullptr, 4), -1);
-    EXPECT_EQ(reader_.m_errorCode, 36);
+    got[0] = 'x';
+    iotrace::Reset();
+    const struct {
+        wxInt64 position;
+        int size;
+        bool destination;
+        std::int32_t code;
+    } refused[] = {
+        {4095999, 2, true, 37}, {INT64_MAX - 1, 2, true, 37},  // the end overflows
+        {0x1000000000000, 2, true, 37},                        // beyond 32-bit block numbers
+        {-1, 1, true, 36},      {0, -1, true, 36},      {0, 4, false, 36},
+    };
+    for (const auto& r : refused) {
+        reader_.m_errorCode = 0;
+        EXPECT_EQ(reader_.BlockRead(reader_.m_diskFile, r.position, r.destination ? got : nullptr, r.size), -1);
+        EXPECT_EQ(reader_.m_errorCode, r.code) << r.position << " " << r.size;
+    }
     EXPECT_EQ(got[0], 'x');
     EXPECT_TRUE(iotrace::Reads(path).empty());
+    ASSERT_EQ(reader_.BlockRead(reader_.m_diskFile, 4095999, got, 2), -1);
+    EXPECT_EQ(ErrorText(), "FUNCTION[1150]Pos=4095999, Size=2, OffsetAddressSpace=0, OffsetBlockSpace=1048576");
+    ASSERT_EQ(reader_.BlockRead(reader_.m_diskFile, -1, got, 1), -1);
+    EXPECT_EQ(ErrorText(), "FUNCTION[1141]");
 
     reader_.CloseDVRFS();
     EXPECT_EQ(reader_.BlockRead(nullptr, 0, got, 4), -1);
