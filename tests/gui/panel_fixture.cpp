@@ -75,3 +75,26 @@ std::vector<HostEventRecord> PanelTest::Events(int type) const
             found.push_back(r);
     return found;
 }
+
+std::vector<std::string> PanelTest::Transcript() const
+{
+    std::vector<std::string> lines;
+    for (const HostEventRecord& r : EventManager::Get()->History()) {
+        const std::string at = " " + r.address.utf8_string() + " #" + std::to_string(r.record);
+        if (r.type == iEVT_HDD_CONNECTED)
+            lines.push_back("connect" + at);
+        else if (r.type == iEVT_HDD_DISCONNECTED)
+            lines.push_back("disconnect" + at);
+        else if (r.type == iEVT_HDD_COMMAND)
+            lines.push_back("speed " + std::to_string(r.command));
+        else if (r.type == QRIX_START_FILEPLAY)
+            lines.push_back("file play");
+        else if (r.type == iEVT_REMOTE_DISCONNECTED)
+            lines.push_back("remote disconnect" + at);
+        else if (r.type == QRIX_CLOSE_ALL)
+            lines.push_back("close all");
+        else
+            lines.push_back("event " + std::to_string(r.type));
+    }
+    return lines;
+}

@@ -32,6 +32,10 @@ protected:
     MorvanePlugConfig* OpenPanel();
     MorvanePlugConfig* panel() const { return plugin_->m_configPanel; }
     std::vector<HostEventRecord> Events(int type) const;
+    // The events the host heard since its history was last cleared, a line
+    // each: "connect 127.0.0.1 #1", "disconnect 127.0.0.1 #0", "speed 2048",
+    // "file play", "remote disconnect 127.0.0.1 #1", "close all".
+    std::vector<std::string> Transcript() const;
 
     std::string dir_;
     wxFrame* frame_ = nullptr;

@@ -16,6 +16,9 @@ void AnswerChannels(QrixFileEvent& event)
     }
 }
 
+using Lines = std::vector<std::string>;
+using K = BasicGLPane::Call::Kind;
+
 class PlaybackTest : public PanelTest {
 protected:
     void SetUp() override
@@ -35,21 +38,25 @@ protected:
         PanelTest::TearDown();
     }
 
-    void Press(void (MorvanePlugConfig::*handler)(wxCommandEvent&))
+    // Presses the buttons in turn; what the host heard from them.
+    Lines Press(std::initializer_list<void (MorvanePlugConfig::*)(wxCommandEvent&)> handlers)
     {
-        wxCommandEvent click(wxEVT_BUTTON);
-        (panel_->*handler)(click);
+        EventManager::Get()->ClearHistory();
+        for (auto handler : handlers) {
+            wxCommandEvent click(wxEVT_BUTTON);
+            (panel_->*handler)(click);
+        }
+        return Transcript();
     }
-    std::vector<int> Commands() const
+    Lines Play(int row)
     {
-        std::vector<int> speeds;
-        for (const HostEventRecord& r : Events(iEVT_HDD_COMMAND))
-            speeds.push_back(r.command);
-        return speeds;
+        EventManager::Get()->ClearHistory();
+        panel_->SendMorvaneCommand(row);
+        return Transcript();
     }
-    std::vector<BasicGLPane::Call::Kind> CanvasCalls() const
+    std::vector<K> CanvasCalls() const
     {
-        std::vector<BasicGLPane::Call::Kind> kinds;
+        std::vector<K> kinds;
         for (const BasicGLPane::Call& c : panel_->m_glPane->Calls())
             kinds.push_back(c.kind);
         return kinds;
@@ -58,43 +65,35 @@ protected:
     MorvanePlugConfig* panel_ = nullptr;
 };
 
-using K = BasicGLPane::Call::Kind;
+const auto kPlay = &MorvanePlugConfig::OnPlayVideo;
+const auto kPause = &MorvanePlugConfig::OnPauseVideo;
+const auto kStop = &MorvanePlugConfig::OnStopVideo;
+const auto kForward = &MorvanePlugConfig::OnForwardVideo;
+const auto kBack = &MorvanePlugConfig::OnBackVideo;
+const auto kSwitch = &MorvanePlugConfig::OnSwitchToFilePlay;
 
 TEST_F(PlaybackTest, FirstPlayConnectsAndStartsADecoderForTheAnsweredChannels)
 {
-    panel_->SendMorvaneCommand(1);
-    EXPECT_TRUE(Events(iEVT_HDD_DISCONNECTED).empty());
+    EXPECT_EQ(Play(1), (Lines{"connect 127.0.0.1 #1"}));
+    EXPECT_EQ(Events(iEVT_HDD_CONNECTED)[0].id, iEVT_MORVANE_WINDOW);
     EXPECT_TRUE(FrameManager::Get()->Calls().empty());
-    const std::vector<HostEventRecord> connects = Events(iEVT_HDD_CONNECTED);
-    ASSERT_EQ(connects.size(), 1u);
-    EXPECT_EQ(connects[0].id, iEVT_MORVANE_WINDOW);
-    EXPECT_EQ(connects[0].record, 1u);
-    EXPECT_NE(panel_->m_decoder, nullptr);
+    ASSERT_NE(panel_->m_decoder, nullptr);
     EXPECT_EQ(*panel_->m_decoder->m_filePath, panel_->m_diskPath);
     EXPECT_EQ(CanvasCalls(), (std::vector<K>{K::kReset, K::kOn}));
     EXPECT_EQ(panel_->m_glPane->Calls()[1].address, 0x7F000001u);
     EXPECT_EQ(CSoundout::Get()->Routes(), (std::vector<std::pair<int, int>>{{0, 0}}));
-    EXPECT_EQ(panel_->m_connAddress, "127.0.0.1");
     EXPECT_EQ(panel_->m_playState, 0);
 
     panel_->m_catalog->Entries[0].Idx = 70000;  // the record number is the low 16 bits of the list index
-    panel_->SendMorvaneCommand(0);
-    EXPECT_EQ(Events(iEVT_HDD_CONNECTED)[1].record, 70000u & 0xFFFF);
+    EXPECT_EQ(Play(0), (Lines{"disconnect 127.0.0.1 #1", "connect 127.0.0.1 #4464"}));
 }
 
+// Four channels answered: the next play takes each down, picture then sound.
 TEST_F(PlaybackTest, SecondPlayTakesDownTheFirstChannelByChannel)
 {
     g_channels = 4;
-    panel_->SendMorvaneCommand(0);
-    EventManager::Get()->ClearHistory();
-    panel_->SendMorvaneCommand(2);
-
-    const std::vector<HostEventRecord> history = EventManager::Get()->History();
-    ASSERT_EQ(history.size(), 2u);
-    EXPECT_EQ(history[0].type, iEVT_HDD_DISCONNECTED);
-    EXPECT_EQ(history[0].address, "127.0.0.1");
-    EXPECT_EQ(history[0].record, 0u);
-    EXPECT_EQ(history[1].type, iEVT_HDD_CONNECTED);
+    Play(0);
+    EXPECT_EQ(Play(2), (Lines{"disconnect 127.0.0.1 #0", "connect 127.0.0.1 #2"}));
     const std::vector<FrameManager::Call>& calls = FrameManager::Get()->Calls();
     ASSERT_EQ(calls.size(), 8u);
     for (int channel = 0; channel < 4; ++channel) {
@@ -111,122 +110,84 @@ TEST_F(PlaybackTest, SecondPlayTakesDownTheFirstChannelByChannel)
 TEST_F(PlaybackTest, MoreThan32ChannelsStartNothingButAreCleanedUpNextTime)
 {
     g_channels = 33;
-    panel_->SendMorvaneCommand(0);
+    Play(0);
     EXPECT_EQ(panel_->m_decoder, nullptr);
     EXPECT_TRUE(panel_->m_glPane->Calls().empty());
     EXPECT_TRUE(CSoundout::Get()->Routes().empty());
-    EXPECT_EQ(panel_->m_playState, 0);
     g_channels = 1;
-    panel_->SendMorvaneCommand(1);
+    EXPECT_EQ(Play(1), (Lines{"connect 127.0.0.1 #1"}));  // no decoder to take down
     EXPECT_EQ(FrameManager::Get()->Calls().size(), 66u);
-    EXPECT_TRUE(Events(iEVT_HDD_DISCONNECTED).empty());  // no decoder to take down
 }
 
+// Forward and reverse double their own speed up to 16 times; pause sets both back.
 TEST_F(PlaybackTest, ForwardAndReverseKeepTheirOwnSteps)
 {
-    for (int i = 0; i < 5; ++i)
-        Press(&MorvanePlugConfig::OnForwardVideo);
-    EXPECT_EQ(Commands(), (std::vector<int>{2048, 4096, 8192, 16384, 16384}));
-    EXPECT_EQ(panel_->m_forwardStep, 3);
+    EXPECT_EQ(Press({kForward, kForward, kForward, kForward, kForward}),
+              (Lines{"speed 2048", "speed 4096", "speed 8192", "speed 16384", "speed 16384"}));
     EXPECT_EQ(panel_->m_playState, 3);
-    EventManager::Get()->ClearHistory();
-    for (int i = 0; i < 6; ++i)
-        Press(&MorvanePlugConfig::OnBackVideo);
-    EXPECT_EQ(Commands(), (std::vector<int>{-1024, -2048, -4096, -8192, -16384, -16384}));
+    EXPECT_EQ(Press({kBack, kBack, kBack, kBack, kBack, kBack}),
+              (Lines{"speed -1024", "speed -2048", "speed -4096", "speed -8192", "speed -16384", "speed -16384"}));
     EXPECT_EQ(panel_->m_playState, 4);
-
-    Press(&MorvanePlugConfig::OnPauseVideo);  // both steps back to 0
-    EventManager::Get()->ClearHistory();
-    Press(&MorvanePlugConfig::OnForwardVideo);
-    Press(&MorvanePlugConfig::OnForwardVideo);
-    Press(&MorvanePlugConfig::OnBackVideo);
-    Press(&MorvanePlugConfig::OnForwardVideo);
-    EXPECT_EQ(Commands(), (std::vector<int>{2048, 4096, -1024, 8192}));
-    const HostEventRecord command = Events(iEVT_HDD_COMMAND)[0];
-    EXPECT_EQ(command.mode, 2);
-    EXPECT_EQ(command.id, iEVT_MORVANE_WINDOW);
+    Press({kPause});
+    EXPECT_EQ(Press({kForward, kForward, kBack, kForward}),
+              (Lines{"speed 2048", "speed 4096", "speed -1024", "speed 8192"}));
+    EXPECT_EQ(Events(iEVT_HDD_COMMAND)[0].mode, 2);
+    EXPECT_EQ(Events(iEVT_HDD_COMMAND)[0].id, iEVT_MORVANE_WINDOW);
 }
 
 TEST_F(PlaybackTest, PlayRestartsOnlyWhenStopped)
 {
-    Press(&MorvanePlugConfig::OnPlayVideo);  // fresh panel: stopped, nothing to restart
-    EXPECT_TRUE(EventManager::Get()->History().empty());
+    EXPECT_EQ(Press({kPlay}), Lines{});  // fresh panel: stopped, nothing to restart
     EXPECT_EQ(panel_->m_playState, 2);
-
-    panel_->SendMorvaneCommand(2);
-    EventManager::Get()->ClearHistory();
-    Press(&MorvanePlugConfig::OnForwardVideo);
-    Press(&MorvanePlugConfig::OnPlayVideo);
-    Press(&MorvanePlugConfig::OnForwardVideo);
-    EXPECT_EQ(Commands(), (std::vector<int>{2048, 1024, 2048}));
-
-    Press(&MorvanePlugConfig::OnStopVideo);
+    Play(2);
+    EXPECT_EQ(Press({kForward, kPlay, kForward}), (Lines{"speed 2048", "speed 1024", "speed 2048"}));
+    EXPECT_EQ(Press({kStop}), (Lines{"disconnect 127.0.0.1 #2"}));
     EXPECT_EQ(panel_->m_decoder, nullptr);
     EXPECT_EQ(panel_->m_playState, 2);
-    EXPECT_EQ(Events(iEVT_HDD_DISCONNECTED).size(), 1u);
-    Press(&MorvanePlugConfig::OnPauseVideo);
-    Press(&MorvanePlugConfig::OnPlayVideo);  // paused, not stopped: a speed command
-    EXPECT_EQ(Commands().back(), 1024);
-    EXPECT_EQ(Events(iEVT_HDD_CONNECTED).size(), 0u);
-
-    Press(&MorvanePlugConfig::OnStopVideo);  // no decoder: nothing sent
-    EventManager::Get()->ClearHistory();
+    EXPECT_EQ(Press({kPause, kPlay}), (Lines{"speed 0", "speed 1024"}));  // paused, not stopped: a speed
+    EXPECT_EQ(Press({kStop}), Lines{});                                   // no decoder: nothing sent
     FrameManager::Get()->ClearCalls();
-    Press(&MorvanePlugConfig::OnPlayVideo);  // stopped: the last recording again
-    EXPECT_TRUE(Events(iEVT_HDD_DISCONNECTED).empty());
-    EXPECT_EQ(FrameManager::Get()->Calls().size(), 2u);  // the old channel's clean-up
-    ASSERT_EQ(Events(iEVT_HDD_CONNECTED).size(), 1u);
-    EXPECT_EQ(Events(iEVT_HDD_CONNECTED)[0].record, 2u);
+    EXPECT_EQ(Press({kPlay}), (Lines{"connect 127.0.0.1 #2"}));  // stopped: the last recording again
+    EXPECT_EQ(FrameManager::Get()->Calls().size(), 2u);          // the old channel's clean-up
 }
 
 TEST_F(PlaybackTest, SwitchToFilePlayHandsOverOnceAndFindsNoCanvasTheSecondTime)
 {
-    panel_->SendMorvaneCommand(0);
-    EventManager::Get()->ClearHistory();
-    Press(&MorvanePlugConfig::OnSwitchToFilePlay);
-    const std::vector<HostEventRecord> history = EventManager::Get()->History();
-    ASSERT_EQ(history.size(), 2u);
-    EXPECT_EQ(history[0].type, iEVT_HDD_DISCONNECTED);
-    EXPECT_EQ(history[1].type, QRIX_START_FILEPLAY);
+    Play(0);
+    EXPECT_EQ(Press({kSwitch}), (Lines{"disconnect 127.0.0.1 #0", "file play"}));
+    EXPECT_EQ(Events(iEVT_HDD_DISCONNECTED)[0].id, 0);
     EXPECT_EQ(panel_->m_glPane, nullptr);
     EXPECT_FALSE(panel_->m_dialog->IsShown());
     EXPECT_EQ(panel_->m_playState, 0);
-
-    Press(&MorvanePlugConfig::OnSwitchToFilePlay);
-    EXPECT_EQ(Events(QRIX_START_FILEPLAY).size(), 2u);
+    EXPECT_EQ(Press({kSwitch}), (Lines{"file play"}));
     wxSizeEvent resize(wxSize(1024, 768));
     panel_->OnSize(resize);  // a layout without a canvas
 }
 
-TEST_F(PlaybackTest, DeletingDuringPlaybackDisconnectsWithoutClosingAll)
-{
-    panel_->SendMorvaneCommand(1);
-    EventManager::Get()->ClearHistory();
-    plugin_->OnRelease(false);
-    EXPECT_EQ(Events(iEVT_REMOTE_DISCONNECTED).size(), 1u);
-    EXPECT_TRUE(Events(QRIX_CLOSE_ALL).empty());
-}
-
-TEST_F(PlaybackTest, ClosingDuringPlaybackDisconnectsOnceAndSwitchesTheChannelsOff)
+// Closing the dialog while playing disconnects once and closes all; deleting
+// the panel later sends nothing more. Deleting while playing disconnects
+// without closing all.
+TEST_F(PlaybackTest, ClosingOrDeletingDuringPlaybackDisconnectsOnce)
 {
     g_channels = 2;
-    panel_->SendMorvaneCommand(1);
+    Play(1);
     EventManager::Get()->ClearHistory();
     panel_->m_dialog->Close();
     gui::Pump();
-    const std::vector<HostEventRecord> history = EventManager::Get()->History();
-    ASSERT_EQ(history.size(), 2u);
-    EXPECT_EQ(history[0].type, iEVT_REMOTE_DISCONNECTED);
-    EXPECT_EQ(history[0].address, "127.0.0.1");
-    EXPECT_EQ(history[0].record, 1u);
-    EXPECT_EQ(history[0].panelId, panel_->m_panelId);
-    EXPECT_EQ(history[1].type, QRIX_CLOSE_ALL);
+    EXPECT_EQ(Transcript(), (Lines{"remote disconnect 127.0.0.1 #1", "close all"}));
+    EXPECT_EQ(Events(iEVT_REMOTE_DISCONNECTED)[0].panelId, panel_->m_panelId);
     EXPECT_EQ(panel_->m_glPane, nullptr);
     EXPECT_EQ(panel_->m_decoder, nullptr);
-
     EventManager::Get()->ClearHistory();
-    plugin_->OnRelease(false);  // deleting the closed panel: no second disconnect
-    EXPECT_TRUE(EventManager::Get()->History().empty());
+    plugin_->OnRelease(false);
+    EXPECT_EQ(Transcript(), Lines{});
+
+    panel_ = OpenPanel();
+    panel_->SendHddList(0);
+    Play(1);
+    EventManager::Get()->ClearHistory();
+    plugin_->OnRelease(false);
+    EXPECT_EQ(Transcript(), (Lines{"remote disconnect 127.0.0.1 #1"}));
 }
 
 }  // namespace
