@@ -160,10 +160,15 @@ int ExportRows(CatalogReader& reader, const std::string& disk, const std::vector
     for (const dvrfstool::ExportOutcome& outcome : outcomes)
         frames += outcome.framesWritten;
     const dvrfstool::ExportOutcome& first = outcomes.front();
-    std::string which = "row " + std::to_string(readable.front());
-    if (readable.size() > 1)
-        which = "rows " + std::to_string(readable.front()) + " to " + std::to_string(readable.back()) + " (" +
-                std::to_string(readable.size()) + " recordings)";
+    // "row 1", "rows 1, 3", or for many "rows 1 to 30 (25 recordings)"
+    std::string which = readable.size() == 1 ? "row " : "rows ";
+    if (readable.size() <= 8) {
+        for (std::size_t i = 0; i < readable.size(); ++i)
+            which += (i ? ", " : "") + std::to_string(readable[i]);
+    } else {
+        which += std::to_string(readable.front()) + " to " + std::to_string(readable.back()) + " (" +
+                 std::to_string(readable.size()) + " recordings)";
+    }
     std::fprintf(say, "%s: %s, %lld frames, %.1f s from %s, %.3g frames/s (%s)\n", output.c_str(), which.c_str(),
                  frames, outcomes.back().seconds, TextTime(first.firstTime).c_str(), first.framesPerSecond,
                  first.timingFromStream ? "the stream's timing" : "the recording's times");
