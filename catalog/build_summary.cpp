@@ -135,3 +135,21 @@ std::string DescribeBuild(CatalogBuild result, const CatalogReader& reader, cons
     }
     return "";
 }
+
+std::string PositionsText(const std::vector<std::int32_t>& positions, std::size_t maxRuns)
+{
+    std::string text;
+    std::size_t runs = 0;
+    for (std::size_t i = 0; i < positions.size();) {
+        std::size_t end = i + 1;
+        while (end < positions.size() && positions[end] == positions[end - 1] + 1)
+            ++end;
+        if (runs == maxRuns)
+            return text + ", ... (" + std::to_string(positions.size()) + " in all)";
+        text += (runs++ ? ", " : "") + std::to_string(positions[i]);
+        if (end - i > 1)
+            text += "-" + std::to_string(positions[end - 1]);
+        i = end;
+    }
+    return text;
+}

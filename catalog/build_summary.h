@@ -4,7 +4,10 @@
 #ifndef CATALOG_BUILD_SUMMARY_H
 #define CATALOG_BUILD_SUMMARY_H
 
+#include <cstddef>
+#include <cstdint>
 #include <string>
+#include <vector>
 
 #include "catalog/catalog_reader.h"
 
@@ -14,5 +17,10 @@
 // (both superblocks damaged)". `reader` is the one that ran the build on
 // `path`, as it was left.
 std::string DescribeBuild(CatalogBuild result, const CatalogReader& reader, const std::string& path);
+
+// List positions (ascending) as runs, "2, 6, 9-40", at most `maxRuns` of
+// them and then how many there are in all: a ring of a million damaged
+// entries is said in a line, not a million numbers.
+std::string PositionsText(const std::vector<std::int32_t>& positions, std::size_t maxRuns = 20);
 
 #endif

@@ -330,3 +330,16 @@ INSTANTIATE_TEST_SUITE_P(
     CaseName<SummaryCase>);
 
 }  // namespace
+
+namespace {
+
+// Skipped positions are said as runs, and a long list is cut with its count.
+TEST(PositionsTextTest, RunsThenHowManyInAll)
+{
+    EXPECT_EQ(PositionsText({}), "");
+    EXPECT_EQ(PositionsText({2, 6}), "2, 6");
+    EXPECT_EQ(PositionsText({4, 5, 6, 9}), "4-6, 9");
+    EXPECT_EQ(PositionsText({1, 3, 5, 7}, 2), "1, 3, ... (4 in all)");
+}
+
+}  // namespace

@@ -16,6 +16,7 @@
 #include <string>
 #include <vector>
 
+#include "catalog/build_summary.h"
 #include "catalog/catalog_reader.h"
 #include "tools/dvrfs/command_line.h"
 #include "tools/dvrfs/disk_check.h"
@@ -255,9 +256,7 @@ void ReportSkipped(const CatalogReader& reader)
     const std::vector<std::int32_t>& skipped = reader.m_skippedPositions;
     if (skipped.empty())
         return;
-    std::string positions;
-    for (std::int32_t position : skipped)
-        positions += (positions.empty() ? "" : ", ") + std::to_string(position);
+    const std::string positions = PositionsText(skipped);
     std::fflush(stdout);
     std::fprintf(stderr, "dvrfs: %zu damaged recording entr%s skipped (list position%s %s)\n", skipped.size(),
                  skipped.size() == 1 ? "y" : "ies", skipped.size() == 1 ? "" : "s", positions.c_str());

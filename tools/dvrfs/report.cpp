@@ -180,10 +180,8 @@ void WriteHtml(const std::string& path, const ReportRequest& request, const std:
         out << "<li class=\"damaged\">" << Html(line) << "</li>\n";
     out << "</ul>\n";
     if (!skipped.empty()) {
-        out << "<p class=\"damaged\">List entries damaged in both copies, without a row:";
-        for (std::int32_t position : skipped)
-            out << " " << position;
-        out << "</p>\n";
+        out << "<p class=\"damaged\">List entries damaged in both copies, without a row: "
+            << PositionsText(skipped) << "</p>\n";
     }
     out << "<h2>Recordings</h2>\n<table>\n<tr><th>Row</th><th>List index</th><th>Start (UTC)</th><th>End (UTC)</th>"
         << "<th>Start (local time)</th><th>End (local time)</th><th>Seconds</th><th>Picture</th></tr>\n";
