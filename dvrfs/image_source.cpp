@@ -238,7 +238,8 @@ private:
         return true;
     }
 
-    static constexpr std::uint32_t kMaxChunkSize = 64u << 20;
+    // The largest chunk an acquisition tool writes: 32,768 sectors of 4096 bytes.
+    static constexpr std::uint32_t kMaxChunkSize = 128u << 20;
     static constexpr std::size_t kChunkSlack = 4096;  // a stored chunk may be a little larger than its data
     static constexpr std::uint64_t kNoChunk = ~0ull;
 
