@@ -64,8 +64,16 @@ std::string WhyNotARecorderDisk(const CatalogReader& reader, const std::string& 
     case kErrTableSize: return "not a recorder disk (both block tables damaged)";
     case kErrTableLimit:
     case kErrGeometry: return "not a recorder disk (its superblock describes an impossible layout)";
-    default: return "not a recorder disk (both superblocks damaged)";
+    default: break;
     }
+    // A header of the wrong size or magic in both places is no superblock at
+    // all (another file system, zeros, random bytes); a header that is there
+    // but fails its sum is a damaged one.
+    const std::string text = reader.m_errorText;
+    if (reader.m_errorCode == kErrSuperBlock &&
+        (text.rfind("FUNCTION[909]", 0) == 0 || text.rfind("FUNCTION[916]", 0) == 0))
+        return "not a recorder disk: no superblock at the start";
+    return "not a recorder disk (both superblocks damaged)";
 }
 
 // An image file shorter than the disk its superblock describes was cut short

@@ -56,7 +56,7 @@ TEST_F(PanelTest, StatusLineSaysWhatTheDriveHoldsOrWhyItCannotBeRead)
         std::string status;
     } cases[] = {
         {0, 2, "PHYSICALDRIVE0 (" + d + "0.img): 2 recordings, 2023-11-14 22:13 to 2023-11-15 00:13 (local time)"},
-        {1, 0, "PHYSICALDRIVE1 (" + d + "1.img): not a recorder disk (both superblocks damaged)"},
+        {1, 0, "PHYSICALDRIVE1 (" + d + "1.img): not a recorder disk: no superblock at the start"},
         {0, 2, "PHYSICALDRIVE0 (" + d + "0.img): 2 recordings, 2023-11-14 22:13 to 2023-11-15 00:13 (local time)"},
         {3, 0, "PHYSICALDRIVE3 (" + d + "3.img): cannot open: No such file or directory"},
         {2, 0, "PHYSICALDRIVE2 (" + d + "2.img): no recordings"},

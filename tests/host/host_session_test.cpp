@@ -138,7 +138,7 @@ TEST_F(HostSessionTest, ToolbarOpensThePanelAndAChosenDriveListsItsRecordings)
     bool said = false;
     for (wxWindow* child : list->GetParent()->GetChildren())
         if (auto* text = dynamic_cast<wxStaticText*>(child))
-            said = said || text->GetToolTipText().EndsWith("disk1.img): not a recorder disk (both superblocks damaged)");
+            said = said || text->GetToolTipText().EndsWith("disk1.img): not a recorder disk: no superblock at the start");
     EXPECT_TRUE(said);
     if (const char* shot = std::getenv("MORVANE_FAILED_SCREENSHOT"))
         SaveScreenshot(list->GetParent(), shot);

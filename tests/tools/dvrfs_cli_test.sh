@@ -188,6 +188,16 @@ err=$("$dvrfs" lsit "$work/one.img" 2>&1)
 check "an unknown command is named" "dvrfs: no command 'lsit'
 Try 'dvrfs --help'." "$err"
 check "options before the disk" "$("$dvrfs" list "$work/one.img" --json)" "$("$dvrfs" list --json "$work/one.img")"
+# Failures in plain words, the register's code after them.
+head -c 65536 /dev/urandom > "$work/random.img"
+cp --sparse=always "$work/one.img" "$work/cut.img" && truncate -s 600000 "$work/cut.img"
+for case in "missing.img:cannot open: No such file or directory" ":cannot read: Is a directory (reader's code 33" \
+    "random.img:not a recorder disk: no superblock at the start (reader's code 33: FUNCTION[9" \
+    "cut.img:the image is 600 KB but the disk it holds is"; do
+  err=$("$dvrfs" list "$work/${case%%:*}" 2>&1)
+  check "list of ${case%%:*} exits 1" 1 $?
+  case "$err" in *"${case#*:}"*) ;; *) check "list of ${case%%:*} says: ${case#*:}" "${case#*:}" "$err" ;; esac
+done
 
 # --- export: the sample clip's frames, 25 a second, a key frame a second
 "$mkdvrfs" --h264 "$clip" --recording 0:0:1:1700000000:1700000002:25 \
