@@ -190,8 +190,10 @@ Try 'dvrfs --help'." "$err"
 check "options before the disk" "$("$dvrfs" list "$work/one.img" --json)" "$("$dvrfs" list --json "$work/one.img")"
 # Failures in plain words, the register's code after them.
 head -c 65536 /dev/urandom > "$work/random.img"
+: > "$work/empty.img"
 cp --sparse=always "$work/one.img" "$work/cut.img" && truncate -s 600000 "$work/cut.img"
 for case in "missing.img:cannot open: No such file or directory" ":cannot read: Is a directory (reader's code 33" \
+    "empty.img:not a recorder disk (the image is empty)" \
     "random.img:not a recorder disk: no superblock at the start (reader's code 33: FUNCTION[9" \
     "cut.img:the image is 600 KB but the disk it holds is"; do
   err=$("$dvrfs" list "$work/${case%%:*}" 2>&1)
