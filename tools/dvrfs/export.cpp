@@ -448,6 +448,8 @@ std::vector<ExportOutcome> ExportRecordings(CatalogReader& reader, const std::ve
                                             const std::function<void(double)>& progress)
 {
     std::vector<ExportOutcome> outcomes(recordings.size());
+    if (recordings.empty())
+        return outcomes;
     if (!reader.m_volume || !reader.m_volume->adapter || reader.m_volume->adapter->DataBlockMax <= 0) {
         for (ExportOutcome& outcome : outcomes)
             outcome.error = "the disk has no data ring";

@@ -3,6 +3,7 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cerrno>
 #include <climits>
 #include <cmath>
@@ -157,9 +158,14 @@ int ExportRows(CatalogReader& reader, const std::string& disk, const std::vector
     }
     FILE* say = output == "-" ? stderr : stdout;
     long long frames = 0;
-    for (const dvrfstool::ExportOutcome& outcome : outcomes)
+    double seconds = 0;
+    const dvrfstool::ExportOutcome* first = &outcomes.front();  // the first that wrote a frame, if any did
+    for (const dvrfstool::ExportOutcome& outcome : outcomes) {
+        if (first->framesWritten == 0 && outcome.framesWritten > 0)
+            first = &outcome;
         frames += outcome.framesWritten;
-    const dvrfstool::ExportOutcome& first = outcomes.front();
+        seconds = std::max(seconds, outcome.seconds);
+    }
     // "row 1", "rows 1, 3", or for many "rows 1 to 30 (25 recordings)"
     std::string which = readable.size() == 1 ? "row " : "rows ";
     if (readable.size() <= 8) {
@@ -170,8 +176,8 @@ int ExportRows(CatalogReader& reader, const std::string& disk, const std::vector
                  std::to_string(readable.size()) + " recordings)";
     }
     std::fprintf(say, "%s: %s, %lld frames, %.1f s from %s, %.3g frames/s (%s)\n", output.c_str(), which.c_str(),
-                 frames, outcomes.back().seconds, TextTime(first.firstTime).c_str(), first.framesPerSecond,
-                 first.timingFromStream ? "the stream's timing" : "the recording's times");
+                 frames, seconds, TextTime(first->firstTime).c_str(), first->framesPerSecond,
+                 first->timingFromStream ? "the stream's timing" : "the recording's times");
     if (output != "-") {
         const std::string digest = dvrfstool::Sha256OfFile(output);
         std::ofstream sidecar(output + ".sha256");
