@@ -324,9 +324,12 @@ int ExportCommand(const CommandLine& line)
         return UsageError(target + " is no folder: several recordings need one, or --merge");
     // One file for all the rows with --merge, else one for each.
     std::vector<std::vector<int>> files;
-    if (merge)
+    if (merge) {
+        // In the order the recorder wrote them, each once.
+        std::sort(rows.begin(), rows.end());
+        rows.erase(std::unique(rows.begin(), rows.end()), rows.end());
         files.push_back(rows);
-    else
+    } else
         for (int row : rows)
             files.push_back({row});
     int status = kOk;
