@@ -232,6 +232,35 @@ check "export --merge: no warning of the damage outside the range" "" "$(cat "$w
 check "list --local: the date and time in the workstation's zone" "$(printf '0\t0\t1700000000\t1700000002\t2023/11/14 23:13:20-23:13:22')" \
   "$(TZ=Europe/Berlin "$dvrfs" list --local "$work/clip.img" | head -1)"
 
+# --- recover: a list ring of four that wrapped over the two oldest recordings
+"$mkdvrfs" --data-blocks 16 --list-max 4 --h264 "$clip" \
+  --overwritten 0:1:1699990000:1699990002:25 --overwritten 2:3:1699993600:1699993602:25 \
+  --recording 0:4:5:1700000000:1700000002:25 --recording 1:6:7:1700003600:1700003602:25 \
+  --recording 2:8:8:1700007200:1700007201:25 --recording 3:9:10:1700010800:1700010802:25 "$work/wrapped.img" >/dev/null
+out=$("$dvrfs" recover "$work/wrapped.img" 2>"$work/err")
+check "recover finds the blocks whose entries were written over" \
+  "$(printf 'blocks 0:3\t4 blocks\t100 frames\tafter -\tbefore 2023-11-14T22:13:20Z')" "$out"
+check "recover says what it read" "dvrfs: 1 run(s) of unlisted blocks; 16 blocks scanned, 9 headers read (UTC)" \
+  "$(cat "$work/err")"
+check "recover --local" "$(printf 'blocks 0:3\t4 blocks\t100 frames\tafter -\tbefore 2023-11-14T23:13:20+0100')" \
+  "$(TZ=Europe/Berlin "$dvrfs" recover --local "$work/wrapped.img" 2>/dev/null)"
+check "recover --json" '{"blocks_scanned": 16, "headers_read": 9, "runs": [{"first_block": 0, "last_block": 3, "blocks": 4, "frames": 100, "after": null, "before": "2023-11-14T22:13:20Z"}]}' \
+  "$("$dvrfs" recover "$work/wrapped.img" --json 2>/dev/null)"
+out=$("$dvrfs" export "$work/wrapped.img" --blocks 0:3 -o "$work/out")
+check "export --blocks of the run" "$work/out/blocks0-3.mp4: blocks 0 to 3, 100 frames, 4.0 s, 25 frames/s" "$out"
+out=$("$dvrfs" extract "$work/wrapped.img" --blocks 0:3 -o "$work/run.h264")
+check "extract --blocks writes the run's frames" "100 frames, $(wc -c < "$work/run.h264") bytes written to $work/run.h264" "$out"
+"$dvrfs" export "$work/wrapped.img" --blocks 3 -o "$work/out" 2>/dev/null
+check "export --blocks takes FIRST:LAST" 2 $?
+
+# --- an E01 image of a disk: read as the disk, its acquisition named
+if command -v ewfacquire >/dev/null; then
+  ewfacquire -u -q -c fast -t "$work/case" "$work/wrapped.img" >/dev/null 2>&1
+  check "list of the E01 is the list of the disk" "$("$dvrfs" list "$work/wrapped.img")" "$("$dvrfs" list "$work/case.E01")"
+  check "info names the image and what it says" "image=E01 image, 1 segment
+image_media_size=$(stat -c %s "$work/wrapped.img")" "$("$dvrfs" info "$work/case.E01" | grep -E '^image(_media_size)?=')"
+fi
+
 # --- report
 "$dvrfs" report "$work/clip.img" -o "$work/report" >/dev/null
 check "report: an HTML page with a picture of each recording" 2 "$(grep -o '<img alt="row [0-9]*" src="data:image/png;base64,' "$work/report/report.html" | wc -l)"
