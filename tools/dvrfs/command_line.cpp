@@ -6,6 +6,7 @@
 #include <cstdio>
 
 #include "catalog/build_summary.h"
+#include "tools/dvrfs/export.h"
 
 namespace dvrfscli {
 
@@ -43,10 +44,16 @@ void SetTextZone(Zone zone)
     textZone = zone;
 }
 
+Zone TextZone()
+{
+    return textZone;
+}
+
 std::string TextTime(double seconds)
 {
-    return TimeText(static_cast<std::time_t>(seconds), textZone == Zone::kUtc ? "%Y-%m-%dT%H:%M:%SZ" : "%Y-%m-%dT%H:%M:%S%z",
-                    textZone);
+    if (textZone == Zone::kUtc)
+        return dvrfstool::IsoUtc(seconds);
+    return TimeText(static_cast<std::time_t>(seconds), "%Y-%m-%dT%H:%M:%S%z", Zone::kLocal);
 }
 
 const char* TextZoneName()

@@ -48,6 +48,7 @@ int UsageError(const std::string& message);
 // The zone of the times that the text outputs print: UTC, or with --local
 // the workstation's. JSON times stay UTC.
 void SetTextZone(Zone zone);
+Zone TextZone();
 // "2023-11-14T22:13:20Z" in UTC, "2023-11-14T23:13:20+0100" in local time.
 std::string TextTime(double seconds);
 // "UTC" or "local time".

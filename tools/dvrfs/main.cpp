@@ -262,7 +262,7 @@ void ReportSkipped(const CatalogReader& reader)
                  skipped.size() == 1 ? "y" : "ies", skipped.size() == 1 ? "" : "s", positions.c_str());
 }
 
-int List(const char* disk, bool json, bool local)
+int List(const char* disk, bool json)
 {
     CatalogReader reader;
     if (const int status = BuildCatalog(reader, disk); status != kOk)
@@ -275,7 +275,7 @@ int List(const char* disk, bool json, bool local)
             const std::uint32_t start = static_cast<std::uint32_t>(e.StartTime);
             const std::uint32_t end = static_cast<std::uint32_t>(e.EndTime);
             std::string when = std::string(e.DateText) + " " + e.TimeText;
-            if (local)
+            if (TextZone() == Zone::kLocal)
                 when = TimeText(start, "%Y/%m/%d %H:%M:%S-", Zone::kLocal) + TimeText(end, "%H:%M:%S", Zone::kLocal);
             std::printf("%d\t%d\t%u\t%u\t%s\n", row, e.Idx, start, end, when.c_str());
         }
@@ -474,7 +474,7 @@ int main(int argc, char** argv)
     if (line.command == "info" && operands == 1)
         return Info(disk.c_str(), line.Has("--dump"), line.Has("--json"));
     if (line.command == "list" && operands == 1)
-        return List(disk.c_str(), line.Has("--json"), line.Has("--local"));
+        return List(disk.c_str(), line.Has("--json"));
     if (line.command == "verify" && operands == 1)
         return Verify(disk.c_str(), line.Has("--json"));
     if (line.command == "extract" && operands == 2 && line.Value("-o") && !line.Value("--blocks"))
