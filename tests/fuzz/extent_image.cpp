@@ -4,7 +4,6 @@
 #include <unistd.h>
 
 #include <algorithm>
-#include <cstdlib>
 #include <cstring>
 
 namespace fuzzdisk {
@@ -139,10 +138,6 @@ const std::string& ScratchImage()
 
 std::string WriteImage(const std::uint8_t* data, std::size_t size)
 {
-    // The image goes when the fuzzer ends: a sparse disk of up to 1 TiB
-    // left in memory-backed /dev/shm is not free.
-    static const bool removedAtExit = std::atexit([] { ::unlink(ScratchImage().c_str()); }) == 0;
-    (void)removedAtExit;
     const std::string& path = ScratchImage();
     const int fd = ::open(path.c_str(), O_RDWR | O_CREAT | O_TRUNC | O_CLOEXEC, 0600);
     if (fd < 0)
