@@ -1,5 +1,6 @@
 #include "catalog/build_summary.h"
 #include "catalog/time_text.h"
+#include "dvrfs/error_places.h"
 
 #include <fcntl.h>
 #include <sys/stat.h>
@@ -70,8 +71,10 @@ std::string WhyNotARecorderDisk(const CatalogReader& reader, const std::string& 
     // all (another file system, zeros, random bytes); a header that is there
     // but fails its sum is a damaged one.
     const std::string text = reader.m_errorText;
-    if (reader.m_errorCode == kErrSuperBlock &&
-        (text.rfind("FUNCTION[909]", 0) == 0 || text.rfind("FUNCTION[916]", 0) == 0))
+    auto refusedAt = [&text](int place) {
+        return text.rfind(std::string(dvrfs::kFunctionWord) + "[" + std::to_string(place) + "]", 0) == 0;
+    };
+    if (reader.m_errorCode == kErrSuperBlock && (refusedAt(dvrfs::kAtHeaderSize) || refusedAt(dvrfs::kAtMagic)))
         return "not a recorder disk: no superblock at the start";
     return "not a recorder disk (both superblocks damaged)";
 }
