@@ -13,7 +13,6 @@
 
 namespace {
 
-using dvrimage::DiskImage;
 using dvrimage::GeneratedRecording;
 using dvrimage::Layout;
 using dvrimage::Recording;
@@ -31,32 +30,26 @@ Recording EntryOnly(std::int32_t listIdx, std::uint32_t startTime, std::uint32_t
 class CatalogBuildTest : public DiskTest {
 protected:
     // A disk whose recordings sit at these list positions, oldest first.
-    std::string WriteDisk(const std::vector<int>& positions, Layout layout = SmallLayout(),
-                          const std::string& name = "disk.img")
+    std::string WriteListed(const std::vector<int>& positions, const Layout& layout = SmallLayout(),
+                            const std::string& name = "disk.img")
     {
-        image_ = std::make_unique<DiskImage>(layout);
+        std::vector<Recording> recordings;
         for (std::size_t i = 0; i < positions.size(); ++i) {
             const std::uint32_t start = 1000 * static_cast<std::uint32_t>(positions[i]);
-            if (i + 1 == positions.size())
-                image_->Add(GeneratedRecording(positions[i], 0, 0, start, start + 500, layout.dataBlockMax, 1, 16));
-            else
-                image_->Add(EntryOnly(positions[i], start, start + 500));
+            recordings.push_back(i + 1 == positions.size() ? GeneratedRecording(positions[i], 0, 0, start, start + 500,
+                                                                                layout.dataBlockMax, 1, 16)
+                                                           : EntryOnly(positions[i], start, start + 500));
         }
-        return WriteImage(*image_, name);
+        return WriteDisk(layout, recordings, {}, name);
     }
-
-    CatalogBuild Build(const std::string& path) { return catalog_.BuildCatalog(wxString::FromUTF8(path.c_str())); }
 
     std::vector<int> Indices() const
     {
         std::vector<int> indices;
-        for (int i = 0; i < catalog_.m_recordCount; ++i)
-            indices.push_back(catalog_.m_catalog->Entries[i].Idx);
+        for (int i = 0; i < reader_.m_recordCount; ++i)
+            indices.push_back(reader_.m_catalog->Entries[i].Idx);
         return indices;
     }
-
-    CatalogReader catalog_;
-    std::unique_ptr<DiskImage> image_;
 };
 
 // The span from the oldest to the newest, around the end of the ring, of at
@@ -73,14 +66,14 @@ TEST_F(CatalogBuildTest, SpanIsReadFromTheOldestAroundTheRingToTheNewest)
     for (const auto& c : cases) {
         Layout layout = SmallLayout();
         layout.listMax = c.listMax;
-        ASSERT_EQ(Build(WriteDisk(c.positions, layout, std::to_string(c.listMax) + ".img")), CatalogBuild::kBuilt);
+        ASSERT_EQ(Build(WriteListed(c.positions, layout, std::to_string(c.listMax) + ".img")), CatalogBuild::kBuilt);
         const std::vector<int> rows(c.positions.begin(), c.positions.begin() + c.rows);
         EXPECT_EQ(Indices(), rows);
-        EXPECT_EQ(catalog_.m_catalog->SpanCount, c.spanCount);
-        EXPECT_EQ(catalog_.m_catalog->Entries[0].StartTime, 1000 * c.positions[0]);
-        EXPECT_EQ(catalog_.m_catalog->Entries[c.rows - 1].EndTime, 1000 * c.positions[c.rows - 1] + 500);
+        EXPECT_EQ(reader_.m_catalog->SpanCount, c.spanCount);
+        EXPECT_EQ(reader_.m_catalog->Entries[0].StartTime, 1000 * c.positions[0]);
+        EXPECT_EQ(reader_.m_catalog->Entries[c.rows - 1].EndTime, 1000 * c.positions[c.rows - 1] + 500);
         if (c.rows < 8192) {
-            EXPECT_EQ(catalog_.m_catalog->Entries[c.rows].Idx, -1);
+            EXPECT_EQ(reader_.m_catalog->Entries[c.rows].Idx, -1);
         }
     }
 }
@@ -103,37 +96,32 @@ TEST_P(DamagedListTest, DamagedEntryCostsOnlyItsOwnRow)
 {
     Layout layout = SmallLayout();
     layout.dataBlockMax = 16;
-    image_ = std::make_unique<DiskImage>(layout);
+    std::vector<Recording> recordings;
     for (int i = 0; i < 12; ++i)
-        image_->Add(GeneratedRecording(i, i, i, 1000 * i, 1000 * i + 500, 16, 2, 64));
+        recordings.push_back(GeneratedRecording(i, i, i, 1000 * i, 1000 * i + 500, 16, 2, 64));
     std::vector<Damage> damage;
     for (int p : GetParam().damagedBoth)
         damage.insert(damage.end(), {{Target::ListEntry, p}, {Target::ListMirror, p}});
     for (int p : GetParam().damagedRing)
         damage.push_back({Target::ListEntry, p});
-    const std::string path = WriteDamaged(*image_, damage);
+    const std::string path = WriteDisk(layout, recordings, damage);
 
     ASSERT_EQ(Build(path), CatalogBuild::kBuilt);
     EXPECT_EQ(Indices(), GetParam().rows);
-    EXPECT_EQ(catalog_.m_skippedPositions, GetParam().skipped);
-    EXPECT_EQ(catalog_.m_catalog->SpanCount, GetParam().spanCount);
-    EXPECT_EQ(catalog_.m_errorCode, 50);
+    EXPECT_EQ(reader_.m_skippedPositions, GetParam().skipped);
+    EXPECT_EQ(reader_.m_catalog->SpanCount, GetParam().spanCount);
+    EXPECT_EQ(reader_.m_errorCode, 50);
 
     // Each row plays and extracts its own entry's recording.
-    for (int row = 0; row < catalog_.m_recordCount; ++row) {
+    for (int row = 0; row < reader_.m_recordCount; ++row) {
         const int idx = GetParam().rows[static_cast<std::size_t>(row)];
         _HisiList_t recording{};
-        ASSERT_TRUE(dvrfstool::RecordingOfRow(catalog_, row, &recording));
+        ASSERT_TRUE(dvrfstool::RecordingOfRow(reader_, row, &recording));
         EXPECT_EQ(recording.Idx, idx);
-        std::vector<unsigned char> stream;
-        dvrfstool::ExtractRecording(catalog_, recording, [&stream](const dvrfstool::ExtractedFrame& f) {
-            stream.insert(stream.end(), f.data, f.data + f.size);
-            return true;
-        });
         std::vector<std::uint8_t> expected = dvrimage::PatternPayload(idx, 0, 64);
         const std::vector<std::uint8_t> second = dvrimage::PatternPayload(idx, 1, 64);
         expected.insert(expected.end(), second.begin(), second.end());
-        EXPECT_EQ(stream, expected) << "row " << row;
+        EXPECT_EQ(Extracted(reader_, recording), expected) << "row " << row;
     }
 }
 
@@ -158,7 +146,7 @@ TEST_P(OddAdapterTest, RecordingsThatCanBeReadAreListed)
     Layout layout = SmallLayout();
     layout.blockCount = 40000;
     GetParam().change(layout);
-    const std::string path = WriteDisk({0, 1}, layout);
+    const std::string path = WriteListed({0, 1}, layout);
     ASSERT_EQ(Build(path), CatalogBuild::kBuilt);
     EXPECT_EQ(Indices(), (std::vector<int>{0, 1}));
 }
@@ -174,43 +162,42 @@ INSTANTIATE_TEST_SUITE_P(
 
 TEST_F(CatalogBuildTest, NegativePositionsAreSkippedWithoutAReadAndAHugeSpanIsCutTo16Bits)
 {
-    const std::string path = WriteDisk({0, 1, 2});
+    const std::string path = WriteListed({0, 1, 2});
     ASSERT_EQ(Build(path), CatalogBuild::kBuilt);
     // A span from position -70000 to 2: only 0, 1 and 2 can be read.
-    catalog_.m_volume->adapter->FirstList.Idx = -70000;
+    reader_.m_volume->adapter->FirstList.Idx = -70000;
     iotrace::Reset();
-    catalog_.Setplaylist();
+    reader_.Setplaylist();
     EXPECT_EQ(Indices(), (std::vector<int>{0, 1, 2}));
-    EXPECT_EQ(catalog_.m_catalog->SpanCount, (70003 & 0xFFFF));
+    EXPECT_EQ(reader_.m_catalog->SpanCount, (70003 & 0xFFFF));
     EXPECT_EQ(iotrace::Reads(path).size(), 3u);
 }
 
 TEST_F(CatalogBuildTest, NewestBelowZeroAndBelowTheOldestCountsAsWrapped)
 {
-    const std::string path = WriteDisk({3, 4, 5});  // a ring of 16
+    const std::string path = WriteListed({3, 4, 5});  // a ring of 16
     ASSERT_EQ(Build(path), CatalogBuild::kBuilt);
-    catalog_.m_volume->adapter->LastList.Idx = -2;  // -2 + 16 = 14: read from 3 until the first unreadable
-    catalog_.Setplaylist();
+    reader_.m_volume->adapter->LastList.Idx = -2;  // -2 + 16 = 14: read from 3 until the first unreadable
+    reader_.Setplaylist();
     EXPECT_EQ(Indices(), (std::vector<int>{3, 4, 5}));
-    EXPECT_EQ(catalog_.m_catalog->SpanCount, 12);
+    EXPECT_EQ(reader_.m_catalog->SpanCount, 12);
 
-    catalog_.m_volume->adapter->LastList.Idx = -20;  // still below the oldest: nothing, and no span
-    catalog_.m_catalog->SpanCount = 77;
-    catalog_.Setplaylist();
-    EXPECT_EQ(catalog_.m_recordCount, 0);
-    EXPECT_EQ(catalog_.m_catalog->SpanCount, 77);
-    EXPECT_EQ(catalog_.m_catalog->Entries[0].Idx, -1);
+    reader_.m_volume->adapter->LastList.Idx = -20;  // still below the oldest: nothing, and no span
+    reader_.m_catalog->SpanCount = 77;
+    reader_.Setplaylist();
+    EXPECT_EQ(reader_.m_recordCount, 0);
+    EXPECT_EQ(reader_.m_catalog->SpanCount, 77);
+    EXPECT_EQ(reader_.m_catalog->Entries[0].Idx, -1);
 }
 
 TEST_F(CatalogBuildTest, TextsAreUtcDateAndClockTimes)
 {
-    DiskImage image(SmallLayout());
-    image.Add(EntryOnly(0, 0, 86399));
-    image.Add(EntryOnly(1, 1700000000, 1700003723));
-    image.Add(GeneratedRecording(2, 0, 0, 951782400, 951868799, 8, 1, 16));  // 29 February 2000
-    ASSERT_EQ(Build(WriteImage(image)), CatalogBuild::kBuilt);
+    ASSERT_EQ(Build(WriteDisk(SmallLayout(), {EntryOnly(0, 0, 86399), EntryOnly(1, 1700000000, 1700003723),
+                                              // 29 February 2000
+                                              GeneratedRecording(2, 0, 0, 951782400, 951868799, 8, 1, 16)})),
+              CatalogBuild::kBuilt);
 
-    const CatalogEntry* e = catalog_.m_catalog->Entries;
+    const CatalogEntry* e = reader_.m_catalog->Entries;
     EXPECT_STREQ(e[0].DateText, "1970/01/01");
     EXPECT_STREQ(e[0].TimeText, "00:00:00-23:59:59");
     EXPECT_STREQ(e[1].DateText, "2023/11/14");
@@ -221,13 +208,13 @@ TEST_F(CatalogBuildTest, TextsAreUtcDateAndClockTimes)
 
 TEST_F(CatalogBuildTest, SecondBuildReplacesTheFirstAndAFailedOneEmptiesIt)
 {
-    const std::string first = WriteDisk({0, 1, 2, 3, 4}, SmallLayout(), "first.img");
-    const std::string second = WriteDisk({7, 8}, SmallLayout(), "second.img");
+    const std::string first = WriteListed({0, 1, 2, 3, 4}, SmallLayout(), "first.img");
+    const std::string second = WriteListed({7, 8}, SmallLayout(), "second.img");
     ASSERT_EQ(Build(first), CatalogBuild::kBuilt);
-    RecordCatalog* catalog = catalog_.m_catalog;
+    RecordCatalog* catalog = reader_.m_catalog;
 
     ASSERT_EQ(Build(second), CatalogBuild::kBuilt);
-    EXPECT_EQ(catalog_.m_catalog, catalog);
+    EXPECT_EQ(reader_.m_catalog, catalog);
     EXPECT_EQ(Indices(), (std::vector<int>{7, 8}));
     EXPECT_EQ(catalog->Entries[2].Idx, -1);
     EXPECT_EQ(catalog->Entries[2].StartTime, 0);
@@ -240,12 +227,10 @@ TEST_F(CatalogBuildTest, SecondBuildReplacesTheFirstAndAFailedOneEmptiesIt)
 
     Layout unconfigured = SmallLayout();
     unconfigured.version = 0;
-    DiskImage blank(unconfigured);
-    EXPECT_EQ(Build(WriteImage(blank, "blank.img")), CatalogBuild::kNotConfigured);
+    EXPECT_EQ(Build(WriteDisk(unconfigured, {}, {}, "blank.img")), CatalogBuild::kNotConfigured);
     Layout noAdapter = SmallLayout();
     noAdapter.adapterRuns.clear();
-    DiskImage empty(noAdapter);
-    EXPECT_EQ(Build(WriteImage(empty, "empty.img")), CatalogBuild::kNoAdapter);
+    EXPECT_EQ(Build(WriteDisk(noAdapter, {}, {}, "empty.img")), CatalogBuild::kNoAdapter);
     EXPECT_EQ(Indices(), (std::vector<int>{}));
 }
 
@@ -269,12 +254,12 @@ TEST_F(CatalogBuildTest, BuildIsDescribedInPlainWords)
     };
     int n = 0;
     for (const auto& c : cases) {
-        DiskImage image(SmallLayout());
-        image.Add(GeneratedRecording(0, 0, 0, 1700000000, 1700000600, 8, 1, 16));
-        image.Add(GeneratedRecording(1, 1, 1, 1700003600, 1700007200, 8, 1, 16));
-        image.Add(GeneratedRecording(2, 2, 2, 1700010000, 1700010100, 8, 1, 16));
-        const std::string path = WriteDamaged(image, c.damage, std::to_string(n++) + ".img");
-        EXPECT_EQ(DescribeBuild(Build(path), catalog_, path), c.summary);
+        const std::string path = WriteDisk(SmallLayout(),
+                                           {GeneratedRecording(0, 0, 0, 1700000000, 1700000600, 8, 1, 16),
+                                            GeneratedRecording(1, 1, 1, 1700003600, 1700007200, 8, 1, 16),
+                                            GeneratedRecording(2, 2, 2, 1700010000, 1700010100, 8, 1, 16)},
+                                           c.damage, std::to_string(n++) + ".img");
+        EXPECT_EQ(DescribeBuild(Build(path), reader_, path), c.summary);
     }
 }
 

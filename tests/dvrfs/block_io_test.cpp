@@ -10,8 +10,6 @@
 
 namespace {
 
-using dvrimage::DiskImage;
-
 constexpr std::int64_t kSpace = 1 << 20;  // OffsetBlockSpace of the small layout
 constexpr std::int64_t kBlock = 4096;
 
@@ -89,17 +87,17 @@ TEST_F(RawReadTest, RefusesWhatCannotBeReadWithoutTouchingTheDestination)
 
 class BlockReadTest : public DiskTest {
 protected:
-    std::string OpenSmallDisk(dvrimage::Layout layout = SmallLayout())
+    std::string OpenSmallDisk(const dvrimage::Layout& layout = SmallLayout())
     {
-        image_ = std::make_unique<DiskImage>(layout);
-        const std::string path = WriteImage(*image_);
+        const std::string path = WriteDisk(layout, {});
         EXPECT_EQ(Open(path), 1);
         return path;
     }
-    std::unique_ptr<DiskImage> image_;
 };
 
-TEST_F(BlockReadTest, MapsLogicalBlocksAcrossTheSkippedPhysicalBlocks)
+// One physical block is left out after every 512 logical ones, and a read is
+// split at block boundaries into sector-aligned pieces.
+TEST_F(BlockReadTest, MapsLogicalBlocksAcrossTheSkippedPhysicalBlocksInSectorPieces)
 {
     const std::string path = OpenSmallDisk();
     wxInt64 offset = 0;
@@ -111,11 +109,6 @@ TEST_F(BlockReadTest, MapsLogicalBlocksAcrossTheSkippedPhysicalBlocks)
         ASSERT_EQ(reader_.BlockShift(block, &offset), 1);
         EXPECT_EQ(offset, physical) << "logical block " << block;
     }
-}
-
-TEST_F(BlockReadTest, SplitsAReadAtBlockBoundariesIntoSectorAlignedPieces)
-{
-    const std::string path = OpenSmallDisk();
     const char marks[] = {'A', 'B'};
     image_->WriteLogical(2097151, marks, 2);  // last byte of block 511, first of block 512
     Refingerprint(path);

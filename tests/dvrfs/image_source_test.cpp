@@ -39,14 +39,10 @@ Digest Read(const std::string& path)
     for (int row = 0; row < reader.m_recordCount; ++row) {
         _HisiList_t recording{};
         dvrfstool::RecordingOfRow(reader, row, &recording);
-        std::string stream;
-        const dvrfstool::ExtractResult result =
-            dvrfstool::ExtractRecording(reader, recording, [&stream](const dvrfstool::ExtractedFrame& f) {
-                stream.append(reinterpret_cast<const char*>(f.data), f.size);
-                return true;
-            });
+        dvrfstool::ExtractResult result;
+        const std::vector<unsigned char> stream = Extracted(reader, recording, &result);
         digest.frames.push_back(result.frames);
-        digest.streamHashes.push_back(std::hash<std::string>()(stream));
+        digest.streamHashes.push_back(std::hash<std::string>()(std::string(stream.begin(), stream.end())));
         digest.skipped += result.skippedFrames;
     }
     CatalogReader verifier;
@@ -94,7 +90,6 @@ protected:
     }
 
     std::string raw_;
-    std::unique_ptr<dvrimage::DiskImage> image_;
 };
 
 TEST_F(ImageSourceTest, SplitAndE01ImagesReadAsTheRawImage)

@@ -10,7 +10,6 @@
 
 namespace {
 
-using dvrimage::DiskImage;
 using dvrimage::GeneratedRecording;
 using dvrimage::Target;
 
@@ -21,12 +20,10 @@ protected:
     void SetUp() override
     {
         DiskTest::SetUp();
-        image_ = std::make_unique<DiskImage>(SmallLayout());
-        image_->Add(GeneratedRecording(0, 0, 1, 100, 200, 8, 3, 1000));
-        image_->Add(GeneratedRecording(1, 2, 3, 300, 400, 8, 3, 1000));
-        image_->Add(GeneratedRecording(2, 4, 5, 500, 600, 8, 3, 1000));
-        image_->Add(GeneratedRecording(15, 6, 7, 700, 800, 8, 3, 1000));
-        path_ = WriteImage(*image_);
+        path_ = WriteDisk(SmallLayout(), {GeneratedRecording(0, 0, 1, 100, 200, 8, 3, 1000),
+                                          GeneratedRecording(1, 2, 3, 300, 400, 8, 3, 1000),
+                                          GeneratedRecording(2, 4, 5, 500, 600, 8, 3, 1000),
+                                          GeneratedRecording(15, 6, 7, 700, 800, 8, 3, 1000)});
     }
 
     void Search()
@@ -58,7 +55,6 @@ protected:
         EXPECT_EQ(ErrorText(), text);
     }
 
-    std::unique_ptr<DiskImage> image_;
     std::string path_;
 };
 

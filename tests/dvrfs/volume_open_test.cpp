@@ -3,6 +3,7 @@
 #include <fcntl.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cstring>
 #include <filesystem>
 #include <fstream>
@@ -12,7 +13,6 @@
 
 namespace {
 
-using dvrimage::DiskImage;
 using dvrimage::GeneratedRecording;
 using dvrimage::Layout;
 using dvrimage::Target;
@@ -59,8 +59,7 @@ TEST_P(OpenTest, OpensOnTheFirstSoundCopyOrSaysWhyNot)
     Layout layout = SmallLayout();
     if (c.change)
         c.change(layout);
-    DiskImage image(layout);
-    const std::string path = WriteDamaged(image, c.damage);
+    const std::string path = WriteDisk(layout, {}, c.damage);
 
     EXPECT_EQ(Open(path), c.opened);
     EXPECT_EQ(reader_.m_errorCode, c.code);
@@ -116,8 +115,7 @@ class VolumeOpenTest : public DiskTest {};
 
 TEST_F(VolumeOpenTest, ValidDiskOpensWithCatalogueAndPartitionCopyAndCleanRegister)
 {
-    DiskImage image(SmallLayout());
-    ASSERT_EQ(Open(WriteImage(image)), 1);
+    ASSERT_EQ(Open(WriteDisk(SmallLayout(), {})), 1);
     EXPECT_STREQ(reader_.m_errorText, "");
     ASSERT_NE(reader_.m_catalog, nullptr);
     EXPECT_EQ(reader_.m_catalog->Opened, 1);
@@ -125,8 +123,8 @@ TEST_F(VolumeOpenTest, ValidDiskOpensWithCatalogueAndPartitionCopyAndCleanRegist
     EXPECT_EQ(reader_.m_catalog->SpanCount, 0);
     EXPECT_EQ(reader_.m_volume->superBlock.BlockTableCount, 4u);
     ASSERT_EQ(reader_.m_volume->blockTable.size(), 5u);
-    for (unsigned char b : reader_.m_volume->blockTable[4].Bytes)
-        EXPECT_EQ(b, 0);
+    const std::uint8_t* tail = reader_.m_volume->blockTable[4].Bytes;
+    EXPECT_EQ(std::count(tail, tail + 32, 0), 32);
     EXPECT_EQ(reader_.m_volume->adapter, nullptr);
     ASSERT_NE(reader_.m_volume->partitionEntry, nullptr);
     const unsigned char expected[16] = {0x00, 0xFE, 0xFF, 0xFF, 0x83, 0xFE, 0xFF, 0xFF,
@@ -148,10 +146,9 @@ TEST_F(VolumeOpenTest, UnreadableSuperBlocksAreRefusedWithoutAllocatingTheirTabl
     ASSERT_NE(reader_.m_catalog, nullptr);  // allocated by the open, kept after the failure
     EXPECT_EQ(reader_.m_catalog->Opened, 1);
 
-    DiskImage image(SmallLayout());
-    const std::string huge = WriteImage(image);
+    const std::string huge = WriteDisk(SmallLayout(), {});
     const std::uint32_t count = 0xFFFFFFFFu;
-    PatchSuperBlocks(image, huge, 0x08, &count, sizeof count);
+    PatchSuperBlocks(*image_, huge, 0x08, &count, sizeof count);
     Refingerprint(huge);
     EXPECT_EQ(Open(huge), 0);
     EXPECT_EQ(reader_.m_errorCode, 40);
@@ -162,16 +159,14 @@ TEST_F(VolumeOpenTest, UnreadableSuperBlocksAreRefusedWithoutAllocatingTheirTabl
 // failure before it.
 TEST_F(VolumeOpenTest, SumFaultKeepsTheTextOfThePreviousFailure)
 {
-    DiskImage image(SmallLayout());
-    const std::string path = WriteDamaged(image, {{Target::PrimarySuperBlock}, {Target::BackupSuperBlock}});
+    const std::string path = WriteDisk(SmallLayout(), {}, {{Target::PrimarySuperBlock}, {Target::BackupSuperBlock}});
     EXPECT_EQ(reader_.BlockRead(nullptr, -1, nullptr, 1), -1);
     EXPECT_EQ(ErrorText(), "FUNCTION[1141]");
     EXPECT_EQ(Open(path), 0);
     EXPECT_EQ(reader_.m_errorCode, 33);
     EXPECT_EQ(ErrorText(), "FUNCTION[1141]");
 
-    DiskImage sound(SmallLayout());
-    ASSERT_EQ(Open(WriteImage(sound, "sound.img")), 1);
+    ASSERT_EQ(Open(WriteDisk(SmallLayout(), {}, {}, "sound.img")), 1);
     for (int mode : {6, 7, 4, 5, 3})  // 4 is no mode: nothing happens
         EXPECT_EQ(reader_.SuperBlockOpe(reader_.m_diskFile, mode, nullptr), 1) << mode;
     reader_.m_volume->superBlock.ReservedHeader[10] ^= 0x40;
@@ -192,14 +187,12 @@ TEST_F(VolumeOpenTest, MissingDeviceLeavesTheRegisterAndASecondOpenClosesTheFirs
     EXPECT_EQ(reader_.m_diskFile, nullptr);
     EXPECT_EQ(reader_.m_volume, nullptr);
 
-    DiskImage first(SmallLayout());
     Layout otherLayout = SmallLayout();
     otherLayout.blockTableCount = 9;
-    DiskImage second(otherLayout);
-    ASSERT_EQ(Open(WriteImage(first, "a.img")), 1);
+    ASSERT_EQ(Open(WriteDisk(SmallLayout(), {}, {}, "a.img")), 1);
     RecordCatalog* catalog = reader_.m_catalog;
     const int filesWithA = OpenFileCount();
-    ASSERT_EQ(Open(WriteImage(second, "b.img")), 1);
+    ASSERT_EQ(Open(WriteDisk(otherLayout, {}, {}, "b.img")), 1);
     EXPECT_EQ(OpenFileCount(), filesWithA);
     EXPECT_EQ(reader_.m_catalog, catalog);
     EXPECT_EQ(reader_.m_volume->superBlock.BlockTableCount, 9u);
@@ -207,12 +200,10 @@ TEST_F(VolumeOpenTest, MissingDeviceLeavesTheRegisterAndASecondOpenClosesTheFirs
 
 TEST_F(VolumeOpenTest, ChecksumIsASignedByte)
 {
-    char abc[] = "abc";
-    char high[] = {static_cast<char>(0x80)};
-    EXPECT_EQ(reader_.Checksum(abc, 3), 0x60);
-    EXPECT_EQ(reader_.Checksum(high, 1), -128);
-    EXPECT_EQ(reader_.Checksum(abc, 0), 0);
-    EXPECT_EQ(reader_.Checksum(abc, -5), 0);
+    char bytes[] = {'a', 'b', 'c', static_cast<char>(0x80)};
+    EXPECT_EQ(reader_.Checksum(bytes, 3), 0x60);
+    EXPECT_EQ(reader_.Checksum(bytes + 3, 1), -128);
+    EXPECT_EQ(reader_.Checksum(bytes, -5), 0);
 }
 
 TEST_F(VolumeOpenTest, CheckconfigReadsTheVersionOfSlotZero)
@@ -223,8 +214,7 @@ TEST_F(VolumeOpenTest, CheckconfigReadsTheVersionOfSlotZero)
         Layout layout = SmallLayout();
         layout.version = version;
         layout.adapterRuns = {{5, 1}};  // slot 0 is not a valid adapter, its version still counts
-        DiskImage image(layout);
-        ASSERT_EQ(Open(WriteImage(image, std::to_string(version) + ".img")), 1);
+        ASSERT_EQ(Open(WriteDisk(layout, {}, {}, std::to_string(version) + ".img")), 1);
         EXPECT_EQ(reader_.Checkconfig(), version);
     }
 }
@@ -234,10 +224,9 @@ TEST_F(VolumeOpenTest, GetInfoReportsTheCurrentAdapter)
     Layout layout = SmallLayout();
     layout.dataBlockMax = 200;
     layout.listMax = 32;
-    DiskImage image(layout);
-    image.Add(GeneratedRecording(3, 10, 20, 1000, 2000, 200, 1, 100));
-    image.Add(GeneratedRecording(4, 30, 50, 3000, 4000, 200, 1, 100));
-    ASSERT_EQ(Open(WriteImage(image)), 1);
+    ASSERT_EQ(Open(WriteDisk(layout, {GeneratedRecording(3, 10, 20, 1000, 2000, 200, 1, 100),
+                                      GeneratedRecording(4, 30, 50, 3000, 4000, 200, 1, 100)})),
+              1);
     EXPECT_EQ(reader_.GetInfo(1), -1);  // no adapter yet
     EXPECT_EQ(reader_.m_errorCode, 38);
     ASSERT_EQ(reader_.BlockOpe(reader_.m_diskFile, 2, nullptr, 0, 0), 1);
@@ -254,8 +243,7 @@ TEST_F(VolumeOpenTest, FillLevelOfAnEmptyDataRingIsRefusedNotDividedByZero)
 {
     Layout layout = SmallLayout();
     layout.dataBlockMax = 0;
-    DiskImage image(layout);
-    ASSERT_EQ(OpenAndSearch(WriteImage(image)), 1);
+    ASSERT_EQ(OpenAndSearch(WriteDisk(layout, {})), 1);
     EXPECT_EQ(reader_.GetInfo(35), 0);
     EXPECT_EQ(reader_.GetInfo(49), -1);
     EXPECT_EQ(reader_.m_errorCode, 84);

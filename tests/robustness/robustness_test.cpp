@@ -27,25 +27,29 @@ long PeakMemoryKiB()
 
 class RobustnessTest : public DiskTest {
 protected:
-    CatalogBuild Build(const std::string& path) { return catalog_.BuildCatalog(wxString::FromUTF8(path.c_str())); }
-    CatalogReader catalog_;
+    // Six recordings, list positions 0 to 5, one data block each.
+    std::string WriteSixRecordings()
+    {
+        std::vector<dvrimage::Recording> recordings;
+        for (int i = 0; i < 6; ++i)
+            recordings.push_back(GeneratedRecording(i, i, i, 100 * i, 100 * i + 50, 8, 1, 16));
+        return WriteDisk(SmallLayout(), recordings);
+    }
 };
 
 TEST_F(RobustnessTest, ReadOnlyImageIsOnlyEverOpenedForReadingAndKeepsItsBytes)
 {
-    DiskImage image(SmallLayout());
-    image.Add(GeneratedRecording(0, 0, 1, 100, 200, 8));
-    image.Add(GeneratedRecording(1, 6, 0, 300, 400, 8));
-    const std::string path = WriteImage(image);
+    const std::string path =
+        WriteDisk(SmallLayout(), {GeneratedRecording(0, 0, 1, 100, 200, 8), GeneratedRecording(1, 6, 0, 300, 400, 8)});
     ASSERT_EQ(::chmod(path.c_str(), 0444), 0);
 
     ASSERT_EQ(Build(path), CatalogBuild::kBuilt);
     CatalogReader verifier;
     dvrfstool::VerifyDisk(verifier, wxString::FromUTF8(path.c_str()), [](const std::string&) {});
     _HisiList_t recording{};
-    ASSERT_TRUE(dvrfstool::RecordingOfRow(catalog_, 1, &recording));
+    ASSERT_TRUE(dvrfstool::RecordingOfRow(reader_, 1, &recording));
     const dvrfstool::ExtractResult extracted =
-        dvrfstool::ExtractRecording(catalog_, recording, [](const dvrfstool::ExtractedFrame&) { return true; });
+        dvrfstool::ExtractRecording(reader_, recording, [](const dvrfstool::ExtractedFrame&) { return true; });
     EXPECT_EQ(extracted.frames, 9);
     EXPECT_GE(iotrace::Opens(path).size(), 2u);  // each open read-only, the bytes unchanged: checked after every test
 }
@@ -60,16 +64,14 @@ TEST_F(RobustnessTest, LargestListRingFullOfDamageCostsABoundedNumberOfReads)
     layout.adapterRuns = {{0, 120}};
     layout.firstListIdx = 0;
     layout.lastListIdx = kMaxListMax - 1;
-    DiskImage image(layout);
-    image.Add(GeneratedRecording(0, 0, 0, 100, 200, 8, 1, 16));
-    const std::string path = WriteImage(image);
+    const std::string path = WriteDisk(layout, {GeneratedRecording(0, 0, 0, 100, 200, 8, 1, 16)});
 
     iotrace::KeepReads(false);
     const long memoryBefore = PeakMemoryKiB();
     ASSERT_EQ(Build(path), CatalogBuild::kBuilt);
     const std::size_t buildReads = iotrace::ReadCount(path);
-    EXPECT_EQ(catalog_.m_recordCount, 1);
-    EXPECT_EQ(catalog_.m_errorCode, 50);
+    EXPECT_EQ(reader_.m_recordCount, 1);
+    EXPECT_EQ(reader_.m_errorCode, 50);
 
     iotrace::Reset();
     iotrace::KeepReads(false);
@@ -144,7 +146,7 @@ TEST_F(RobustnessTest, ManyRecordingsClaimingTheWholeRingAreVerifiedBlockByBlock
     iotrace::KeepReads(false);
     long long headers = 0;
     const dvrfstool::VerifyResult verified =
-        dvrfstool::VerifyDisk(catalog_, wxString::FromUTF8(path.c_str()), [&headers](const std::string& line) {
+        dvrfstool::VerifyDisk(reader_, wxString::FromUTF8(path.c_str()), [&headers](const std::string& line) {
             headers += line.find(" header") != std::string::npos;
         });
     EXPECT_EQ(verified.stage, dvrfstool::VerifyStage::kComplete);
@@ -156,66 +158,57 @@ TEST_F(RobustnessTest, ManyRecordingsClaimingTheWholeRingAreVerifiedBlockByBlock
 
 TEST_F(RobustnessTest, ImageEndingInTheMiddleOfTheListStopsTheCatalogueThere)
 {
-    DiskImage image(SmallLayout());
-    for (int i = 0; i < 6; ++i)
-        image.Add(GeneratedRecording(i, i, i, 100 * i, 100 * i + 50, 8, 1, 16));
-    const std::string path = WriteImage(image);
+    const std::string path = WriteSixRecordings();
     // Cut the file in the middle of list entry 3 (and so before its mirror and
     // the data blocks).
-    std::filesystem::resize_file(path, image.PhysicalOffset(image.ListOffset() + 3 * 128 + 60));
+    std::filesystem::resize_file(path, image_->PhysicalOffset(image_->ListOffset() + 3 * 128 + 60));
     Refingerprint(path);
 
     // Entries 0 to 2 read; the newest of them has its data block beyond the
     // end, so the adapter cannot be brought up to date: no catalogue, and the
     // register names the missing header.
     EXPECT_EQ(Build(path), CatalogBuild::kNoAdapter);
-    EXPECT_EQ(catalog_.m_errorCode, 52);
-    EXPECT_EQ(catalog_.m_recordCount, 0);
+    EXPECT_EQ(reader_.m_errorCode, 52);
+    EXPECT_EQ(reader_.m_recordCount, 0);
 }
 
 TEST_F(RobustnessTest, UnreadableSectorCostsTheEntriesInItAndSaysSo)
 {
-    DiskImage image(SmallLayout());
-    for (int i = 0; i < 6; ++i)
-        image.Add(GeneratedRecording(i, i, i, 100 * i, 100 * i + 50, 8, 1, 16));
-    const std::string path = WriteImage(image);
+    const std::string path = WriteSixRecordings();
     ASSERT_EQ(Build(path), CatalogBuild::kBuilt);
-    ASSERT_EQ(catalog_.m_recordCount, 6);
+    ASSERT_EQ(reader_.m_recordCount, 6);
 
     // The sector of entries 4 and 5, in the ring and in the mirror, fails
     // from now on: the next build lists entries 0 to 3 and names 4 and 5.
-    iotrace::FailReads(path, static_cast<std::int64_t>(image.PhysicalOffset(image.ListOffset() + 4 * 128)), 1);
-    iotrace::FailReads(path, static_cast<std::int64_t>(image.PhysicalOffset(image.ListOffsetBackup() + 4 * 128)), 1);
+    for (std::uint64_t ring : {image_->ListOffset(), image_->ListOffsetBackup()})
+        iotrace::FailReads(path, static_cast<std::int64_t>(image_->PhysicalOffset(ring + 4 * 128)), 1);
     EXPECT_EQ(Build(path), CatalogBuild::kBuilt);
-    EXPECT_EQ(catalog_.m_recordCount, 4);
-    EXPECT_EQ(catalog_.m_skippedPositions, (std::vector<std::int32_t>{4, 5}));
-    EXPECT_EQ(catalog_.m_errorCode, 50);
-    EXPECT_STREQ(catalog_.m_errorText, "FUNCTION[1463]");
+    EXPECT_EQ(reader_.m_recordCount, 4);
+    EXPECT_EQ(reader_.m_skippedPositions, (std::vector<std::int32_t>{4, 5}));
+    EXPECT_EQ(reader_.m_errorCode, 50);
+    EXPECT_STREQ(reader_.m_errorText, "FUNCTION[1463]");
 }
 
 TEST_F(RobustnessTest, DiskThatDisappearsFailsTheReadsAndTheNextBuild)
 {
-    DiskImage image(SmallLayout());
-    image.Add(GeneratedRecording(0, 0, 1, 100, 200, 8, 3, 16));
-    image.Add(GeneratedRecording(1, 2, 3, 300, 400, 8, 3, 16));
-    const std::string path = WriteImage(image);
+    const std::string path = WriteSixRecordings();
     ASSERT_EQ(Build(path), CatalogBuild::kBuilt);
 
     // The disk goes away under the open handle: every read now finds nothing.
     std::filesystem::resize_file(path, 0);
     std::filesystem::remove(path);
     Refingerprint(path);
-    catalog_.m_streamBlock = 0;
-    catalog_.m_streamFrame = 0;
+    reader_.m_streamBlock = 0;
+    reader_.m_streamFrame = 0;
     std::vector<unsigned char> payload(16);
     _HisiHeader_t header{};
-    const _HisiAdapter_t adapter = *catalog_.m_volume->adapter;
-    EXPECT_EQ(catalog_.get_stream(catalog_.m_diskFile, payload.data(), &header, adapter.FirstList, adapter.LastList, 1),
+    const _HisiAdapter_t adapter = *reader_.m_volume->adapter;
+    EXPECT_EQ(reader_.get_stream(reader_.m_diskFile, payload.data(), &header, adapter.FirstList, adapter.LastList, 1),
               -1);
-    EXPECT_EQ(catalog_.m_errorCode, 52);
+    EXPECT_EQ(reader_.m_errorCode, 52);
 
     EXPECT_EQ(Build(path), CatalogBuild::kNotOpened);
-    EXPECT_EQ(catalog_.m_recordCount, 0);
+    EXPECT_EQ(reader_.m_recordCount, 0);
 }
 
 }  // namespace

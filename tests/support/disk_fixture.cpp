@@ -107,6 +107,29 @@ std::string DiskTest::WriteDamaged(dvrimage::DiskImage& image, const std::vector
     return path;
 }
 
+std::string DiskTest::WriteDisk(const dvrimage::Layout& layout, const std::vector<dvrimage::Recording>& recordings,
+                                const std::vector<Damage>& damage, const std::string& name)
+{
+    image_ = std::make_unique<dvrimage::DiskImage>(layout);
+    for (const dvrimage::Recording& r : recordings)
+        image_->Add(r);
+    return WriteDamaged(*image_, damage, name);
+}
+
+std::vector<unsigned char> Extracted(CatalogReader& reader, const _HisiList_t& recording,
+                                     dvrfstool::ExtractResult* result)
+{
+    std::vector<unsigned char> stream;
+    const dvrfstool::ExtractResult r =
+        dvrfstool::ExtractRecording(reader, recording, [&stream](const dvrfstool::ExtractedFrame& f) {
+            stream.insert(stream.end(), f.data, f.data + f.size);
+            return true;
+        });
+    if (result)
+        *result = r;
+    return stream;
+}
+
 void DiskTest::Refingerprint(const std::string& path)
 {
     fingerprints_[path] = FileFingerprint(path);

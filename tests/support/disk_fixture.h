@@ -8,10 +8,12 @@
 
 #include <cstdint>
 #include <map>
+#include <memory>
 #include <string>
 #include <vector>
 
-#include "dvrfs/dvr_disk_reader.h"
+#include "catalog/catalog_reader.h"
+#include "tools/dvrfs/disk_check.h"
 #include "tools/dvrimage/dvr_image.h"
 
 // A fingerprint of a sparse file: its size and a hash of its data extents.
@@ -25,6 +27,10 @@ void PatchSuperBlocks(dvrimage::DiskImage& image, const std::string& path, std::
 
 // A small, valid geometry: 4096-byte blocks, 16 list entries, 8 data blocks.
 dvrimage::Layout SmallLayout();
+
+// The payloads extraction delivers for a recording, one after another.
+std::vector<unsigned char> Extracted(CatalogReader& reader, const _HisiList_t& recording,
+                                     dvrfstool::ExtractResult* result = nullptr);
 
 // Table-driven tests: a case's `name` names its test.
 template <typename Case>
@@ -52,17 +58,23 @@ protected:
     std::string WriteDamaged(dvrimage::DiskImage& image, const std::vector<Damage>& damage,
                              const std::string& name = "disk.img");
     void Refingerprint(const std::string& path);
+    // Writes a disk of this geometry and these recordings into image_, then
+    // damages it.
+    std::string WriteDisk(const dvrimage::Layout& layout, const std::vector<dvrimage::Recording>& recordings,
+                          const std::vector<Damage>& damage = {}, const std::string& name = "disk.img");
 
     // Opens the image with reader_ and runs what a catalogue build runs
     // first: configured-recorder check and adapter search.
     int Open(const std::string& path);
     int OpenAndSearch(const std::string& path);
+    CatalogBuild Build(const std::string& path) { return reader_.BuildCatalog(wxString::FromUTF8(path.c_str())); }
 
     const _HisiAdapter_t& Adapter() const { return *reader_.m_volume->adapter; }
     std::string ErrorText() const { return reader_.m_errorText; }
 
     std::string dir_;
-    DvrDiskReader reader_;
+    CatalogReader reader_;
+    std::unique_ptr<dvrimage::DiskImage> image_;
 
 private:
     std::map<std::string, std::string> fingerprints_;

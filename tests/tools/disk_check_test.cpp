@@ -11,7 +11,6 @@
 
 namespace {
 
-using dvrimage::DiskImage;
 using dvrimage::GeneratedRecording;
 
 class DiskCheckTest : public DiskTest {
@@ -22,32 +21,23 @@ protected:
     {
         dvrimage::Layout layout = SmallLayout();
         layout.adapterRecordsFrame = false;
-        image_ = std::make_unique<DiskImage>(layout);
-        image_->Add(GeneratedRecording(0, 0, 1, 100, 200, 8, 3, 100));
-        const std::string path = WriteImage(*image_);
+        const std::string path = WriteDisk(layout, {GeneratedRecording(0, 0, 1, 100, 200, 8, 3, 100)});
         const dvrimage::BlockHeaderBytes header = image_->MakeBlockHeader(1, INT_MAX);
         image_->WriteLogical(image_->DataBlockOffset() + (1 << 24), header.data(), header.size());
         Refingerprint(path);
         return path;
     }
-
-    CatalogReader catalog_;
-    std::unique_ptr<DiskImage> image_;
 };
 
 TEST_F(DiskCheckTest, ExtractionPassesOverFramesABlockOnlyClaims)
 {
     const std::string path = WriteLyingDisk();
-    ASSERT_EQ(catalog_.BuildCatalog(wxString::FromUTF8(path.c_str())), CatalogBuild::kBuilt);
+    ASSERT_EQ(Build(path), CatalogBuild::kBuilt);
     _HisiList_t recording{};
-    ASSERT_TRUE(dvrfstool::RecordingOfRow(catalog_, 0, &recording));
+    ASSERT_TRUE(dvrfstool::RecordingOfRow(reader_, 0, &recording));
 
-    std::vector<unsigned char> stream;
-    const dvrfstool::ExtractResult result =
-        dvrfstool::ExtractRecording(catalog_, recording, [&stream](const dvrfstool::ExtractedFrame& f) {
-            stream.insert(stream.end(), f.data, f.data + f.size);
-            return true;
-        });
+    dvrfstool::ExtractResult result;
+    const std::vector<unsigned char> stream = Extracted(reader_, recording, &result);
     EXPECT_EQ(result.frames, 6);
     EXPECT_EQ(result.skippedFrames, 262142 - 3);  // the rest of what fits in a block, each refused
     std::vector<unsigned char> expected;
@@ -61,7 +51,7 @@ TEST_F(DiskCheckTest, ExtractionPassesOverFramesABlockOnlyClaims)
     // A recording claiming 2^31 blocks is walked once round the ring of 8.
     recording.EndBlock = INT_MAX;
     const dvrfstool::ExtractResult longest =
-        dvrfstool::ExtractRecording(catalog_, recording, [](const dvrfstool::ExtractedFrame&) { return true; });
+        dvrfstool::ExtractRecording(reader_, recording, [](const dvrfstool::ExtractedFrame&) { return true; });
     EXPECT_EQ(longest.frames, 6);
     EXPECT_EQ(longest.skippedBlocks, 6);
 }
@@ -86,9 +76,7 @@ TEST_P(FramesTest, BlockGivesAtMostItsPayloadAreaInThreeReads)
     layout.blockSizeShift = 16;  // a data block in 256 logical blocks: the format skips none inside it
     layout.recordSum = GetParam().recordSum;
     layout.adapterRecordsFrame = false;
-    image_ = std::make_unique<DiskImage>(layout);
-    image_->Add(GeneratedRecording(0, 0, 0, 100, 200, 8, 1, 100));
-    const std::string path = WriteImage(*image_);
+    const std::string path = WriteDisk(layout, {GeneratedRecording(0, 0, 0, 100, 200, 8, 1, 100)});
     const dvrimage::BlockHeaderBytes header = image_->MakeBlockHeader(0, GetParam().frameCount);
     image_->WriteLogical(image_->DataBlockOffset(), header.data(), header.size());
     for (std::size_t k = 0; k < GetParam().entries.size(); ++k) {
@@ -97,13 +85,13 @@ TEST_P(FramesTest, BlockGivesAtMostItsPayloadAreaInThreeReads)
         image_->WriteLogical(image_->IndexEntryPosition(0, static_cast<std::int64_t>(k)), entry.data(), entry.size());
     }
     Refingerprint(path);
-    ASSERT_EQ(catalog_.BuildCatalog(wxString::FromUTF8(path.c_str())), CatalogBuild::kBuilt);
+    ASSERT_EQ(Build(path), CatalogBuild::kBuilt);
     _HisiList_t recording{};
-    ASSERT_TRUE(dvrfstool::RecordingOfRow(catalog_, 0, &recording));
+    ASSERT_TRUE(dvrfstool::RecordingOfRow(reader_, 0, &recording));
 
     iotrace::Reset();
     const dvrfstool::ExtractResult result =
-        dvrfstool::ExtractRecording(catalog_, recording, [](const dvrfstool::ExtractedFrame&) { return true; });
+        dvrfstool::ExtractRecording(reader_, recording, [](const dvrfstool::ExtractedFrame&) { return true; });
     EXPECT_EQ(result.frames, GetParam().frames);
     EXPECT_EQ(result.bytes, GetParam().bytes);
     EXPECT_EQ(result.skippedFrames, GetParam().skipped);
@@ -136,7 +124,7 @@ TEST_F(DiskCheckTest, VerificationReportsTheLyingHeader)
     const std::string path = WriteLyingDisk();
     std::vector<std::string> lines;
     const dvrfstool::VerifyResult result = dvrfstool::VerifyDisk(
-        catalog_, wxString::FromUTF8(path.c_str()), [&lines](const std::string& line) { lines.push_back(line); });
+        reader_, wxString::FromUTF8(path.c_str()), [&lines](const std::string& line) { lines.push_back(line); });
     EXPECT_EQ(result.stage, dvrfstool::VerifyStage::kComplete);
     EXPECT_EQ(lines, (std::vector<std::string>{"damaged: data block 1 header (frame count 2147483647)"}));
     EXPECT_EQ(result.damaged, 1);
@@ -151,24 +139,21 @@ TEST_F(DiskCheckTest, RecoverFindsTheBlocksTheIndexLost)
 {
     dvrimage::Layout layout = SmallLayout();
     layout.dataBlockMax = 12;
-    image_ = std::make_unique<DiskImage>(layout);
     auto overwritten = [](std::int32_t first, std::int32_t last, std::uint32_t start) {
         dvrimage::Recording r = GeneratedRecording(0, first, last, start, start + 60, 12, 3, 100);
         r.listed = false;
         return r;
     };
-    image_->Add(overwritten(0, 1, 1000));
-    image_->Add(overwritten(2, 2, 2000));
-    image_->Add(GeneratedRecording(0, 3, 4, 3000, 3060, 12, 3, 100));
-    image_->Add(GeneratedRecording(1, 5, 6, 4000, 4060, 12, 3, 100));
-    image_->Add(GeneratedRecording(2, 7, 7, 5000, 5060, 12, 3, 100));
-    image_->Add(GeneratedRecording(3, 8, 8, 6000, 6060, 12, 3, 100));
-    const std::string path =
-        WriteDamaged(*image_, {{dvrimage::Target::ListEntry, 2}, {dvrimage::Target::ListMirror, 2}});
-    ASSERT_EQ(catalog_.BuildCatalog(wxString::FromUTF8(path.c_str())), CatalogBuild::kBuilt);
+    const std::string path = WriteDisk(
+        layout,
+        {overwritten(0, 1, 1000), overwritten(2, 2, 2000), GeneratedRecording(0, 3, 4, 3000, 3060, 12, 3, 100),
+         GeneratedRecording(1, 5, 6, 4000, 4060, 12, 3, 100), GeneratedRecording(2, 7, 7, 5000, 5060, 12, 3, 100),
+         GeneratedRecording(3, 8, 8, 6000, 6060, 12, 3, 100)},
+        {{dvrimage::Target::ListEntry, 2}, {dvrimage::Target::ListMirror, 2}});
+    ASSERT_EQ(Build(path), CatalogBuild::kBuilt);
 
     iotrace::Reset();
-    const dvrfstool::RecoverResult result = dvrfstool::FindUnlistedRuns(catalog_);
+    const dvrfstool::RecoverResult result = dvrfstool::FindUnlistedRuns(reader_);
     ASSERT_EQ(result.runs.size(), 2u);
     EXPECT_EQ(result.runs[0].firstBlock, 0);
     EXPECT_EQ(result.runs[0].lastBlock, 2);
@@ -183,12 +168,8 @@ TEST_F(DiskCheckTest, RecoverFindsTheBlocksTheIndexLost)
     EXPECT_EQ(result.headersRead, 12 - 5);  // one per block no listed recording covers
     EXPECT_EQ(iotrace::Reads(path).size(), 3u + 7u);  // the rows' entries, then those headers
 
-    std::vector<unsigned char> stream;
-    const dvrfstool::ExtractResult extracted = dvrfstool::ExtractRecording(
-        catalog_, dvrfstool::RecordingOfBlocks(0, 2), [&stream](const dvrfstool::ExtractedFrame& f) {
-            stream.insert(stream.end(), f.data, f.data + f.size);
-            return true;
-        });
+    dvrfstool::ExtractResult extracted;
+    const std::vector<unsigned char> stream = Extracted(reader_, dvrfstool::RecordingOfBlocks(0, 2), &extracted);
     EXPECT_EQ(extracted.frames, 9);
     EXPECT_EQ(std::vector<unsigned char>(stream.begin(), stream.begin() + 100), dvrimage::PatternPayload(0, 0, 100));
 }

@@ -62,17 +62,16 @@ TEST_P(ExportTest, FileHoldsTheRecordingsFramesAndTime)
     dvrimage::DiskImage image = WriteClipDisk(disk, {{0, 0, 1, 1700000000, 2}, {1, 2, 5, 1700003600, 4}});
     if (c.damagedBlock >= 0)
         image.Damage(dvrimage::Target::BlockHeader, c.damagedBlock);
-    CatalogReader reader;
-    ASSERT_EQ(reader.BuildCatalog(wxString::FromUTF8(disk.c_str())), CatalogBuild::kBuilt);
+    ASSERT_EQ(Build(disk), CatalogBuild::kBuilt);
     _HisiList_t recording{};
-    ASSERT_TRUE(dvrfstool::RecordingOfRow(reader, 1, &recording));
+    ASSERT_TRUE(dvrfstool::RecordingOfRow(reader_, 1, &recording));
 
     dvrfstool::ExportRequest request;
     request.format = c.format;
     request.output = dir_ + "/out." + dvrfstool::Extension(c.format);
     request.from = c.from;
     request.to = c.to;
-    const dvrfstool::ExportOutcome outcome = dvrfstool::ExportRecording(reader, recording, request);
+    const dvrfstool::ExportOutcome outcome = dvrfstool::ExportRecording(reader_, recording, request);
     ASSERT_EQ(outcome.error, "");
     EXPECT_TRUE(outcome.timingFromStream);
     EXPECT_EQ(outcome.extracted.skippedBlocks, c.damagedBlock >= 0 ? 1 : 0);
@@ -106,15 +105,14 @@ TEST_F(MergedExportTest, RecordingsShareOneFileAndKeepThePauseBetweenThem)
 {
     const std::string disk = dir_ + "/disk.img";
     WriteClipDisk(disk, {{0, 0, 1, 1700000000, 2}, {1, 2, 5, 1700003600, 4}});
-    CatalogReader reader;
-    ASSERT_EQ(reader.BuildCatalog(wxString::FromUTF8(disk.c_str())), CatalogBuild::kBuilt);
+    ASSERT_EQ(Build(disk), CatalogBuild::kBuilt);
     std::vector<_HisiList_t> recordings(2);
-    ASSERT_TRUE(dvrfstool::RecordingOfRow(reader, 0, &recordings[0]));
-    ASSERT_TRUE(dvrfstool::RecordingOfRow(reader, 1, &recordings[1]));
+    ASSERT_TRUE(dvrfstool::RecordingOfRow(reader_, 0, &recordings[0]));
+    ASSERT_TRUE(dvrfstool::RecordingOfRow(reader_, 1, &recordings[1]));
     dvrfstool::ExportRequest request;
     request.output = dir_ + "/merged.mp4";
 
-    const std::vector<dvrfstool::ExportOutcome> outcomes = dvrfstool::ExportRecordings(reader, recordings, request);
+    const std::vector<dvrfstool::ExportOutcome> outcomes = dvrfstool::ExportRecordings(reader_, recordings, request);
     ASSERT_EQ(outcomes.size(), 2u);
     EXPECT_EQ(outcomes[1].error, "");
     EXPECT_EQ(outcomes[0].framesWritten + outcomes[1].framesWritten, 150);
