@@ -190,22 +190,6 @@ TEST_F(CatalogBuildTest, NewestBelowZeroAndBelowTheOldestCountsAsWrapped)
     EXPECT_EQ(reader_.m_catalog->Entries[0].Idx, -1);
 }
 
-TEST_F(CatalogBuildTest, TextsAreUtcDateAndClockTimes)
-{
-    ASSERT_EQ(Build(WriteDisk(SmallLayout(), {EntryOnly(0, 0, 86399), EntryOnly(1, 1700000000, 1700003723),
-                                              // 29 February 2000
-                                              GeneratedRecording(2, 0, 0, 951782400, 951868799, 8, 1, 16)})),
-              CatalogBuild::kBuilt);
-
-    const CatalogEntry* e = reader_.m_catalog->Entries;
-    EXPECT_STREQ(e[0].DateText, "1970/01/01");
-    EXPECT_STREQ(e[0].TimeText, "00:00:00-23:59:59");
-    EXPECT_STREQ(e[1].DateText, "2023/11/14");
-    EXPECT_STREQ(e[1].TimeText, "22:13:20-23:15:23");
-    EXPECT_STREQ(e[2].DateText, "2000/02/29");
-    EXPECT_STREQ(e[2].TimeText, "00:00:00-23:59:59");
-}
-
 TEST_F(CatalogBuildTest, SecondBuildReplacesTheFirstAndAFailedOneEmptiesIt)
 {
     const std::string first = WriteListed({0, 1, 2, 3, 4}, SmallLayout(), "first.img");

@@ -70,17 +70,6 @@ TEST_F(AdapterTest, SlotWithAZeroSumButAnotherNumberEndsTheRun)
     EXPECT_EQ(Adapter().Idx, 4);
 }
 
-TEST_F(AdapterTest, ChosenSlotThatChangesWhenReadAgainIsRefused)
-{
-    const std::string path = WriteDisk(SmallLayout(), {});
-    ASSERT_EQ(Open(path), 1);
-    iotrace::CorruptReads(path, (1 << 20) + 100, 2);  // slot 0 arrives changed on its second read
-    EXPECT_EQ(reader_.BlockOpe(reader_.m_diskFile, 2, nullptr, 0, 0), -1);
-    EXPECT_EQ(reader_.m_errorCode, 81);
-    EXPECT_EQ(ErrorText(), "FUNCTION[1241]");
-    EXPECT_EQ(reader_.m_volume->adapter, nullptr);
-}
-
 TEST_F(AdapterTest, AdapterWhoseRingsAreLargerThanAnyRecordersIsRefused)
 {
     Layout list = SmallLayout();
@@ -257,35 +246,6 @@ TEST_F(AdapterTest, NewestFrameIsTheLastReadableIndexEntryThatFits)
     ASSERT_EQ(OpenAndSearch(path), 1);
     EXPECT_EQ(Adapter().CurBlockHeader.FrameCount, 3);
     EXPECT_EQ(Adapter().LastFrame.DataOffset, 200);
-}
-
-TEST_F(AdapterTest, NoReadableIndexEntryFailsUnlessTheAdapterRecordsNoFrame)
-{
-    for (bool recordsFrame : {true, false}) {
-        Layout layout = SmallLayout();
-        layout.adapterRecordsFrame = recordsFrame;
-        const std::string path = WriteDisk(layout, {GeneratedRecording(0, 0, 1, 100, 200, 8, 2, 100)},
-                                           {{Target::IndexEntry, 1, 0}, {Target::IndexEntry, 1, 1}},
-                                           recordsFrame ? "frame.img" : "noframe.img");
-        EXPECT_EQ(OpenAndSearch(path), recordsFrame ? -1 : 1);
-    }
-}
-
-TEST_F(AdapterTest, DumpPrintsTheAdapterInFourLines)
-{
-    Layout layout = SmallLayout();
-    layout.timeStampBase = 77;
-    ASSERT_EQ(OpenAndSearch(WriteDisk(layout, {GeneratedRecording(0, 0, 0, 3661, 90061, 8)})), 1);
-    ::testing::internal::CaptureStdout();
-    EXPECT_EQ(reader_.BlockOpe(reader_.m_diskFile, 5, nullptr, 0, 0), 1);
-    EXPECT_EQ(::testing::internal::GetCapturedStdout(),
-              "\tAdapter: Version=1, TimeStamp=77, Idx=0, Magic=0x48444152\n"
-              "\tList: Offset=491520, OffsetBackup=495616, Max=16\n"
-              "\tDataBlock: Offset=499712, Max=8\n"
-              "\tStartTime=1:1:1(3661), EndTime=1:1:1(90061)\n");
-    reader_.CloseDVRFS();
-    EXPECT_EQ(reader_.BlockOpe(nullptr, 5, nullptr, 0, 0), -1);
-    EXPECT_EQ(reader_.BlockOpe(nullptr, 7, nullptr, 0, 0), 1);  // no such operation: nothing happens
 }
 
 }  // namespace

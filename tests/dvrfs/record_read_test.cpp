@@ -173,25 +173,6 @@ TEST_F(RecordReadTest, LastIndexEntryLiesDirectlyAfterTheHeader)
                                                                                   4 * (1 << 24))));
 }
 
-// A read refused before the device is asked (here: a data block the adapter
-// claims beyond the end of the block space) leaves the caller's record as it
-// was, so an adapter field keeps its value when the refresh cannot read.
-TEST_F(RecordReadTest, ReadRefusedBeforeTheDeviceLeavesTheBufferAsItWas)
-{
-    Search();
-    reader_.m_volume->adapter->DataBlockMax = 1000;
-    const std::int64_t beyond = 900;
-    std::vector<char> buffer(128, '\x5A');
-    const std::vector<char> before = buffer;
-    iotrace::Reset();
-    EXPECT_EQ(ReadHeaders(beyond, 1, buffer.data()), -1);
-    EXPECT_EQ(ReadIndex(beyond, 0, 2, buffer.data()), -1);
-    EXPECT_EQ(ReadPayload(beyond, 0, 128, buffer.data()), -1);
-    EXPECT_EQ(reader_.m_errorCode, 37);
-    EXPECT_EQ(buffer, before);
-    EXPECT_TRUE(iotrace::Reads(path_).empty());
-}
-
 TEST_F(RecordReadTest, OperationsNeedAnAdapterAndIgnoreUnknownCodes)
 {
     ASSERT_EQ(Open(path_), 1);

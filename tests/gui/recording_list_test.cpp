@@ -1,5 +1,5 @@
-// The recording list: its rows in local time, its consumed events, and the
-// activation of a row.
+// The recording list: its rows in local time, the status line, and the
+// activation of a row, by the mouse and by the keyboard.
 #include <wx/uiaction.h>
 
 #include "tests/gui/panel_fixture.h"
@@ -73,33 +73,6 @@ TEST_F(PanelTest, StatusLineSaysWhatTheDriveHoldsOrWhyItCannotBeRead)
     p->SendMorvaneCommand(0);  // the first row of drive 0 is gone with it
     ASSERT_EQ(Events(iEVT_HDD_CONNECTED).size(), 1u);
     EXPECT_EQ(Events(iEVT_HDD_CONNECTED)[0].record, 65535u);
-}
-
-TEST_F(PanelTest, ListEventsStopAtTheListControl)
-{
-    MorvanePlugConfig* p = OpenPanel();
-    int reachedDialog = 0;
-    auto count = [&reachedDialog](wxListEvent& event) {
-        ++reachedDialog;
-        event.Skip();
-    };
-    const wxEventType consumed[] = {
-        wxEVT_LIST_BEGIN_DRAG,    wxEVT_LIST_BEGIN_RDRAG,      wxEVT_LIST_BEGIN_LABEL_EDIT, wxEVT_LIST_END_LABEL_EDIT,
-        wxEVT_LIST_DELETE_ITEM,   wxEVT_LIST_DELETE_ALL_ITEMS, wxEVT_LIST_ITEM_SELECTED,    wxEVT_LIST_ITEM_DESELECTED,
-        wxEVT_LIST_KEY_DOWN,      wxEVT_LIST_ITEM_FOCUSED,     wxEVT_LIST_COL_CLICK,        wxEVT_LIST_COL_RIGHT_CLICK,
-        wxEVT_LIST_COL_BEGIN_DRAG, wxEVT_LIST_COL_DRAGGING,    wxEVT_LIST_COL_END_DRAG,     wxEVT_LIST_CACHE_HINT,
-    };
-    for (wxEventType type : consumed)
-        p->m_dialog->Bind(wxEventTypeTag<wxListEvent>(type), count);
-    for (wxEventType type : consumed) {
-        wxListEvent event(type, p->m_recordList->GetId());
-        event.SetEventObject(p->m_recordList);
-        p->m_recordList->GetEventHandler()->ProcessEvent(event);
-    }
-    wxMouseEvent right(wxEVT_RIGHT_DOWN);
-    EXPECT_TRUE(p->m_recordList->GetEventHandler()->ProcessEvent(right));
-    EXPECT_EQ(reachedDialog, 0);
-    EXPECT_TRUE(EventManager::Get()->History().empty());
 }
 
 TEST_F(PanelTest, ActivatingARowPlaysThatRowOnce)

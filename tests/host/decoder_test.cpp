@@ -112,7 +112,7 @@ TEST_F(DecoderTest, SpeedCodesSetThePaceAndPauseHoldsThePicture)
 }
 
 // Forward: the frames in order from the chosen recording's first; backward:
-// the key frames in reverse order.
+// the key frames in reverse order; stop ends the deliveries.
 TEST_F(DecoderTest, ForwardShowsTheFramesInOrderAndBackwardTheKeyFramesInReverse)
 {
     WriteClipDisk(disk_, {{0, 0, 3, 100}, {1, 4, 7, 200}});
@@ -132,6 +132,10 @@ TEST_F(DecoderTest, ForwardShowsTheFramesInOrderAndBackwardTheKeyFramesInReverse
     for (long long position : seen)
         EXPECT_EQ(position % 100, 0) << "not a key frame: " << position;
     EXPECT_TRUE(canvas_->LastPicture().key);
+    Stop();
+    const int received = canvas_->PicturesReceived();
+    gui::Pump(200);
+    EXPECT_EQ(canvas_->PicturesReceived(), received);
 }
 
 // Playback stops at either end of the disk's recordings with the picture
@@ -166,17 +170,6 @@ TEST_F(DecoderTest, PlaybackStopsAtTheEndsOfTheDiskAndTheCaptionSaysWhere)
     ASSERT_TRUE(PlaybackControl::Get()->Find(kDvr, &session));
     EXPECT_EQ(session.end, -1);
     EXPECT_EQ(canvas_->Caption(), "row 0 \u00B7 1970-01-01 00:01:40 (local time) \u00B7 start of the oldest recording");
-}
-
-TEST_F(DecoderTest, StopEndsTheDeliveries)
-{
-    WriteClipDisk(disk_, {{0, 0, 3, 100}});
-    Start(0);
-    ASSERT_FALSE(Watch(300).empty());
-    Stop();
-    const int received = canvas_->PicturesReceived();
-    gui::Pump(200);
-    EXPECT_EQ(canvas_->PicturesReceived(), received);
 }
 
 TEST_F(DecoderTest, DamagedFrameAndDamagedBlockAreLeftOut)

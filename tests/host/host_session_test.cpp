@@ -232,15 +232,6 @@ TEST_F(HostSessionTest, ActivatedRowPlaysInTheCanvasAndTheTransportCommandsReach
     EXPECT_GT(player->canvas()->PicturesReceived(), held);
 }
 
-TEST_F(HostSessionTest, PluginsStaticTableTookTheHostsToolbarIdentifierWhenLoaded)
-{
-    ASSERT_TRUE(session_->PluginLoaded()) << session_->Error();
-    wxCommandEvent command(wxEVT_MENU, iEVT_REMOTEPLAY_TOOLBAR);
-    session_->plugins().plugin()->ProcessEvent(command);
-    gui::Pump(100);
-    EXPECT_NE(wxWindow::FindWindowById(1012), nullptr);
-}
-
 TEST(PluginHostTest, RefusesALibraryThatIsNoPlugin)
 {
     PluginHost host;

@@ -37,23 +37,6 @@ protected:
     }
 };
 
-TEST_F(RobustnessTest, ReadOnlyImageIsOnlyEverOpenedForReadingAndKeepsItsBytes)
-{
-    const std::string path =
-        WriteDisk(SmallLayout(), {GeneratedRecording(0, 0, 1, 100, 200, 8), GeneratedRecording(1, 6, 0, 300, 400, 8)});
-    ASSERT_EQ(::chmod(path.c_str(), 0444), 0);
-
-    ASSERT_EQ(Build(path), CatalogBuild::kBuilt);
-    CatalogReader verifier;
-    dvrfstool::VerifyDisk(verifier, wxString::FromUTF8(path.c_str()), [](const std::string&) {});
-    _HisiList_t recording{};
-    ASSERT_TRUE(dvrfstool::RecordingOfRow(reader_, 1, &recording));
-    const dvrfstool::ExtractResult extracted =
-        dvrfstool::ExtractRecording(reader_, recording, [](const dvrfstool::ExtractedFrame&) { return true; });
-    EXPECT_EQ(extracted.frames, 9);
-    EXPECT_GE(iotrace::Opens(path).size(), 2u);  // each open read-only, the bytes unchanged: checked after every test
-}
-
 // The worst list the writer can make: a ring of the largest size the reader
 // takes, the span covering all of it, every entry but the first unreadable in
 // both copies.

@@ -11,12 +11,11 @@
 
 namespace {
 
+// Reads of `path` that overlap [offset, offset + length) fail.
 struct Fault {
     std::string path;
     std::int64_t offset;
-    std::int64_t length;   // failing range; 0 for a corruption
-    int fromRead;          // corruption: the first read that changes the byte
-    int readsSeen = 0;
+    std::int64_t length;
 };
 
 struct State {
@@ -27,7 +26,6 @@ struct State {
     std::map<std::string, std::size_t> readCounts;
     bool keepReads = true;
     std::vector<Fault> failures;
-    std::vector<Fault> corruptions;
 };
 
 State& TheState()
@@ -88,26 +86,19 @@ extern "C" ssize_t read(int fd, void* buffer, size_t count)
         path = it->second;
     }
     const std::int64_t offset = lseek64(fd, 0, SEEK_CUR);
-    std::unique_lock<std::mutex> lock(s.mutex);
-    ++s.readCounts[path];
-    if (s.keepReads)
-        s.reads[path].push_back({offset, count});
-    for (const Fault& f : s.failures) {
-        if (f.path == path && offset < f.offset + f.length && f.offset < offset + static_cast<std::int64_t>(count)) {
-            errno = EIO;
-            return -1;
+    {
+        std::lock_guard<std::mutex> lock(s.mutex);
+        ++s.readCounts[path];
+        if (s.keepReads)
+            s.reads[path].push_back({offset, count});
+        for (const Fault& f : s.failures) {
+            if (f.path == path && offset < f.offset + f.length && f.offset < offset + static_cast<std::int64_t>(count)) {
+                errno = EIO;
+                return -1;
+            }
         }
     }
-    lock.unlock();
-    const ssize_t got = real(fd, buffer, count);
-    lock.lock();
-    for (Fault& f : s.corruptions) {
-        if (f.path != path || f.offset < offset || f.offset >= offset + got)
-            continue;
-        if (++f.readsSeen >= f.fromRead)
-            static_cast<unsigned char*>(buffer)[f.offset - offset] ^= 0x01;
-    }
-    return got;
+    return real(fd, buffer, count);
 }
 
 namespace iotrace {
@@ -121,7 +112,6 @@ void Reset()
     s.readCounts.clear();
     s.keepReads = true;
     s.failures.clear();
-    s.corruptions.clear();
 }
 
 std::vector<OpenCall> Opens(const std::string& path)
@@ -160,14 +150,7 @@ void FailReads(const std::string& path, std::int64_t offset, std::int64_t length
 {
     State& s = TheState();
     std::lock_guard<std::mutex> lock(s.mutex);
-    s.failures.push_back({path, offset, length, 0});
-}
-
-void CorruptReads(const std::string& path, std::int64_t offset, int fromRead)
-{
-    State& s = TheState();
-    std::lock_guard<std::mutex> lock(s.mutex);
-    s.corruptions.push_back({path, offset, 0, fromRead});
+    s.failures.push_back({path, offset, length});
 }
 
 }  // namespace iotrace

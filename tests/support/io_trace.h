@@ -2,7 +2,7 @@
 // file and every read from it, with the file offset the read started at. It
 // interposes open64 and read for the whole test binary, so it sees the
 // reader's real system calls through wxFile; it can also make chosen reads
-// fail or deliver a changed byte, the way a failing disk would.
+// fail, the way a failing disk would.
 #ifndef TESTS_SUPPORT_IO_TRACE_H
 #define TESTS_SUPPORT_IO_TRACE_H
 
@@ -36,10 +36,6 @@ void KeepReads(bool keep);
 
 // Reads of `path` that overlap [offset, offset + length) fail with EIO.
 void FailReads(const std::string& path, std::int64_t offset, std::int64_t length);
-
-// From the n-th read (counting from 1) of `path` that covers byte `offset`
-// on, that byte arrives with its lowest bit flipped.
-void CorruptReads(const std::string& path, std::int64_t offset, int fromRead);
 
 }  // namespace iotrace
 
