@@ -17,13 +17,7 @@ dvrimage::DiskImage WriteClipDisk(const std::string& path, const std::vector<Cli
         r.endBlock = c.endBlock;
         r.startTime = c.startTime;
         r.endTime = c.startTime + c.duration;
-        const int blocks = c.endBlock >= c.startBlock ? c.endBlock - c.startBlock + 1
-                                                      : c.endBlock + dataBlocks - c.startBlock + 1;
-        for (int b = 0; b < blocks; ++b) {
-            r.blocks.emplace_back();
-            for (int k = 0; k < 25; ++k, next = (next + 1) % frames.size())
-                r.blocks.back().push_back(dvrimage::Frame{frames[next], 1});
-        }
+        dvrimage::FillWithFrames(r, dataBlocks, 25, frames, next);
         image.Add(r);
     }
     image.Write(path);

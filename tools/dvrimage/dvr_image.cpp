@@ -117,6 +117,22 @@ Recording GeneratedRecording(std::int32_t listIdx, std::int32_t startBlock, std:
     return r;
 }
 
+void FillWithFrames(Recording& recording, std::int32_t ringBlocks, int framesPerBlock,
+                    const std::vector<std::vector<std::uint8_t>>& frames, std::size_t& next)
+{
+    recording.blocks.clear();
+    const std::int64_t first = recording.startBlock;
+    std::int64_t last = recording.endBlock;
+    if (last < first)
+        last += ringBlocks;
+    for (std::int64_t n = first; n <= last && !frames.empty(); ++n) {
+        std::vector<Frame> block;
+        for (int k = 0; k < framesPerBlock; ++k, next = (next + 1) % frames.size())
+            block.push_back(Frame{frames[next], 1});
+        recording.blocks.push_back(std::move(block));
+    }
+}
+
 DiskImage::DiskImage(Layout layout) : layout_(std::move(layout))
 {
     Resolve();

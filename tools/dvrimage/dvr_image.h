@@ -120,6 +120,12 @@ Recording GeneratedRecording(std::int32_t listIdx, std::int32_t startBlock, std:
                              std::uint32_t startTime, std::uint32_t endTime, std::int32_t ringBlocks,
                              int framesPerBlock = 3, std::size_t frameSize = 1000);
 
+// Fills the recording's blocks, from startBlock to endBlock around a ring of
+// ringBlocks, with framesPerBlock of these frames each, in order from `next`
+// (which it advances); the frames start again when used up.
+void FillWithFrames(Recording& recording, std::int32_t ringBlocks, int framesPerBlock,
+                    const std::vector<std::vector<std::uint8_t>>& frames, std::size_t& next);
+
 class DiskImage {
 public:
     explicit DiskImage(Layout layout);

@@ -196,24 +196,6 @@ std::vector<std::vector<std::uint8_t>> FramesOfFile(const std::string& path, std
     return frames;
 }
 
-// The recording's blocks filled with the file's frames, in order, from
-// where the previous recording stopped; the file starts again when used up.
-void FillFromFrames(RecordingArg& arg, std::int32_t ringBlocks, const std::vector<std::vector<std::uint8_t>>& frames,
-                    std::size_t& next)
-{
-    dvrimage::Recording& r = arg.recording;
-    r.blocks.clear();
-    const long long last = r.endBlock < r.startBlock ? static_cast<long long>(r.endBlock) + ringBlocks : r.endBlock;
-    for (long long n = r.startBlock; n <= last; ++n) {
-        std::vector<dvrimage::Frame> block;
-        for (int k = 0; k < arg.framesPerBlock; ++k) {
-            block.push_back(dvrimage::Frame{frames[next], 1});
-            next = (next + 1) % frames.size();
-        }
-        r.blocks.push_back(std::move(block));
-    }
-}
-
 }  // namespace
 
 int main(int argc, char** argv)
@@ -304,7 +286,9 @@ int main(int argc, char** argv)
                                                              r.endTime, layout.dataBlockMax, arg.framesPerBlock,
                                                              arg.frameSize);
             } else {
-                FillFromFrames(arg, layout.dataBlockMax, frames, nextFrame);
+                // From where the previous recording stopped.
+                dvrimage::FillWithFrames(arg.recording, layout.dataBlockMax, arg.framesPerBlock, frames,
+                                         nextFrame);
             }
             image.Add(arg.recording);
         }
