@@ -25,9 +25,6 @@ constexpr std::uint64_t kMaxOffset = 1ull << 40;
 // that the damage paths stay covered. Fuzz builds only.
 std::string WriteImage(const std::uint8_t* data, std::size_t size);
 
-// The extents of a sparse file, as an input (for seeds).
-std::vector<std::uint8_t> ReadExtents(const std::string& path);
-
 }  // namespace fuzzdisk
 
 #endif

@@ -27,6 +27,11 @@ check "mkdvrfs --help" 0 $?
 check "mkdvrfs usage error" 2 $?
 "$mkdvrfs" --damage list "$work/x.img" 2>/dev/null
 check "mkdvrfs damage without index" 2 $?
+"$mkdvrfs" --list-span 0 "$work/x.img" 2>/dev/null
+check "mkdvrfs --list-span takes FIRST:LAST" 2 $?
+"$mkdvrfs" --recording 0:0:0:100:200 --mirror-at 2097152 --data-ring-at 4194304 "$work/placed.img" >/dev/null
+check "mkdvrfs places the list mirror and the data ring" "	List: Offset=491520, OffsetBackup=2097152, Max=64
+	DataBlock: Offset=4194304, Max=8" "$("$dvrfs" info "$work/placed.img" --dump | grep -E '^.(List|DataBlock):')"
 
 # --- info
 "$mkdvrfs" --adapter-run 110:15 \

@@ -27,6 +27,9 @@ Geometry:
   --table-count N         entries in the block table (default 4)
   --list-max N            entries in the list ring (default 64)
   --data-blocks N         16 MiB blocks in the data ring (default 8)
+  --mirror-at N           logical position (bytes) of the list mirror
+  --data-ring-at N        logical position (bytes) of the data ring (default:
+                          the rings follow the adapter ring, in this order)
 
 Adapter:
   --adapter-run S:L       a run of valid adapter slots: L slots from slot S,
@@ -37,6 +40,9 @@ Adapter:
   --record-sum N          XOR sum of every list entry, data block header and
                           index entry (default 90)
   --no-frame              the adapter records no newest frame
+  --list-span FIRST:LAST  the list positions the adapter names as its oldest
+                          and newest recordings (default: the first and the
+                          last recording given)
 
 Recordings, in list order, oldest first (repeatable):
   --recording IDX:START:END:T0:T1[:FRAMES[:SIZE]]
@@ -203,7 +209,7 @@ int main(int argc, char** argv)
     enum {
         kBlockSizeShift = 1000, kBlockCount, kBlockSpaceOffset, kBackupOffset, kTableCount, kListMax,
         kDataBlocks, kAdapterRun, kVersion, kRecordSum, kNoFrame, kRecording, kOverwritten, kFrames, kFrameSize, kDamage,
-        kH264,
+        kH264, kMirrorAt, kDataRingAt, kListSpan,
     };
     static const option options[] = {
         {"block-size-shift", required_argument, nullptr, kBlockSizeShift},
@@ -223,6 +229,9 @@ int main(int argc, char** argv)
         {"frame-size", required_argument, nullptr, kFrameSize},
         {"damage", required_argument, nullptr, kDamage},
         {"h264", required_argument, nullptr, kH264},
+        {"mirror-at", required_argument, nullptr, kMirrorAt},
+        {"data-ring-at", required_argument, nullptr, kDataRingAt},
+        {"list-span", required_argument, nullptr, kListSpan},
         {"help", no_argument, nullptr, 'h'},
         {nullptr, 0, nullptr, 0},
     };
@@ -257,6 +266,16 @@ int main(int argc, char** argv)
         case kVersion: layout.version = static_cast<std::int32_t>(Number(optarg, "--version")); break;
         case kRecordSum: layout.recordSum = static_cast<std::uint8_t>(Number(optarg, "--record-sum")); break;
         case kNoFrame: layout.adapterRecordsFrame = false; break;
+        case kMirrorAt: layout.listOffsetBackup = static_cast<std::uint64_t>(Number(optarg, "--mirror-at")); break;
+        case kDataRingAt: layout.dataBlockOffset = static_cast<std::uint64_t>(Number(optarg, "--data-ring-at")); break;
+        case kListSpan: {
+            const std::vector<long long> v = Numbers(optarg, "--list-span");
+            if (v.size() != 2)
+                UsageError("--list-span takes FIRST:LAST");
+            layout.firstListIdx = static_cast<std::int32_t>(v[0]);
+            layout.lastListIdx = static_cast<std::int32_t>(v[1]);
+            break;
+        }
         case kRecording: recordings.push_back(ParseRecording(optarg)); break;
         case kOverwritten: recordings.push_back(ParseOverwritten(optarg)); break;
         case kFrames: framesFile = optarg; break;
