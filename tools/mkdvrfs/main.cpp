@@ -301,9 +301,11 @@ int main(int argc, char** argv)
         for (RecordingArg& arg : recordings) {
             if (frames.empty()) {
                 const dvrimage::Recording& r = arg.recording;
+                const bool listed = r.listed;  // an --overwritten recording keeps its entry unwritten
                 arg.recording = dvrimage::GeneratedRecording(r.listIdx, r.startBlock, r.endBlock, r.startTime,
                                                              r.endTime, layout.dataBlockMax, arg.framesPerBlock,
                                                              arg.frameSize);
+                arg.recording.listed = listed;
             } else {
                 // From where the previous recording stopped.
                 dvrimage::FillWithFrames(arg.recording, layout.dataBlockMax, arg.framesPerBlock, frames,
