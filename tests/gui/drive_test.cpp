@@ -19,33 +19,6 @@ std::vector<std::string> Drives(MorvanePlugConfig* p)
     return items;
 }
 
-// A left press at a point of the tree, as the mouse would give it.
-void PressAt(CInTreeCombo* tree, const wxPoint& at)
-{
-    wxMouseEvent move(wxEVT_MOTION);
-    move.SetPosition(at);
-    move.SetEventObject(tree);
-    tree->GetEventHandler()->ProcessEvent(move);
-    wxMouseEvent press(wxEVT_LEFT_DOWN);
-    press.SetPosition(at);
-    press.SetEventObject(tree);
-    press.m_leftDown = true;
-    tree->GetEventHandler()->ProcessEvent(press);
-}
-
-wxTreeItemId ItemWithText(CInTreeCombo* tree, const wxString& text)
-{
-    return text == tree->GetItemText(tree->GetRootItem()) ? tree->GetRootItem()
-                                                          : tree->FindItemByText(tree->GetRootItem(), text);
-}
-
-wxPoint LabelCentre(CInTreeCombo* tree, const wxString& text)
-{
-    wxRect rect;
-    tree->GetBoundingRect(ItemWithText(tree, text), rect, true);
-    return wxPoint(rect.x + rect.width / 2, rect.y + rect.height / 2);
-}
-
 // Drives 0, 1, 2 and 4 can be opened: the gap at 3 hides 4.
 TEST_F(PanelTest, TreeListsEveryDriveUpToTheFirstThatCannotBeOpened)
 {
@@ -81,15 +54,11 @@ TEST_F(PanelTest, PressOnALabelChoosesItAndClosesThePopup)
     CInTreeCombo* tree = p->m_driveCombo->m_treePopup;
     p->m_driveCombo->Popup();
     gui::Pump(100);
-    wxRect label;
-    tree->GetBoundingRect(ItemWithText(tree, "PHYSICALDRIVE0"), label, true);
-    PressAt(tree, wxPoint(label.GetRight() + 40, label.y + label.height / 2));
-    gui::Pump(50);
+    gui::ClickAt(tree, gui::LabelCentre(tree, "PHYSICALDRIVE0") + wxPoint(120, 0));
     EXPECT_TRUE(p->m_driveCombo->IsPopupShown());
     EXPECT_EQ(p->m_driveCombo->GetValue(), "");
 
-    PressAt(tree, LabelCentre(tree, "Drivers"));
-    gui::Pump(50);
+    gui::ClickAt(tree, gui::LabelCentre(tree, "Drivers"));
     EXPECT_EQ(p->m_driveCombo->GetValue(), "Drivers");
     EXPECT_TRUE(p->m_diskPath.empty());
     EXPECT_EQ(p->m_catalog, nullptr);
@@ -97,8 +66,7 @@ TEST_F(PanelTest, PressOnALabelChoosesItAndClosesThePopup)
 
     p->m_driveCombo->Popup();
     gui::Pump(100);
-    PressAt(tree, LabelCentre(tree, "PHYSICALDRIVE1"));
-    gui::Pump(100);
+    gui::ClickAt(tree, gui::LabelCentre(tree, "PHYSICALDRIVE1"));
     EXPECT_EQ(p->m_diskPath, wxString(dir_ + "/disk1.img"));
     EXPECT_EQ(p->m_recordList->GetItemCount(), 3);
     EXPECT_EQ(p->m_driveCombo->GetValue(), "PHYSICALDRIVE1");

@@ -14,6 +14,8 @@
 #include <wx/modalhook.h>
 #include <wx/msgdlg.h>
 #include <wx/stdpaths.h>
+#include <wx/treectrl.h>
+#include <wx/uiaction.h>
 
 namespace {
 
@@ -71,6 +73,28 @@ std::vector<wxString> TakeModalMessages()
     std::vector<wxString> messages;
     messages.swap(g_modalMessages);
     return messages;
+}
+
+void ClickAt(wxWindow* window, const wxPoint& point)
+{
+    wxUIActionSimulator mouse;
+    mouse.MouseMove(window->ClientToScreen(point));
+    Pump(100);
+    mouse.MouseClick();
+    Pump(300);
+}
+
+wxPoint LabelCentre(wxTreeCtrl* tree, const wxString& text)
+{
+    const wxTreeItemId root = tree->GetRootItem();
+    wxTreeItemId item = root;
+    wxTreeItemIdValue cookie;
+    for (wxTreeItemId c = tree->GetFirstChild(root, cookie); c.IsOk(); c = tree->GetNextChild(root, cookie))
+        if (tree->GetItemText(c) == text)
+            item = c;
+    wxRect label;
+    tree->GetBoundingRect(item, label, true);
+    return label.GetPosition() + label.GetSize() / 2;
 }
 
 void UseDataPrefix(const wxString& prefix)

@@ -8,7 +8,11 @@
 #include <string>
 #include <vector>
 
+#include <wx/gdicmn.h>
 #include <wx/string.h>
+
+class wxTreeCtrl;
+class wxWindow;
 
 namespace gui {
 
@@ -18,6 +22,13 @@ void Pump(int milliseconds = 30);
 // The messages of the modal dialogs that would have been shown since the
 // last call, which forgets them.
 std::vector<wxString> TakeModalMessages();
+
+// A real left click (through the X server) at a point of a window.
+void ClickAt(wxWindow* window, const wxPoint& point);
+
+// The centre of the label of the tree's first-level item with this text, or
+// of the root's when none has it.
+wxPoint LabelCentre(wxTreeCtrl* tree, const wxString& text);
 
 // Points the toolkit's data directory at `prefix`/share/qrix-host, as the
 // installed host does; the build tree's prefix by default.

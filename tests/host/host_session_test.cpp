@@ -9,7 +9,6 @@
 #include <set>
 #include <filesystem>
 #include <fstream>
-#include <iterator>
 
 #include <wx/combo.h>
 #include <wx/dcmemory.h>
@@ -69,25 +68,7 @@ protected:
         gui::Pump(200);
         auto* tree = dynamic_cast<wxTreeCtrl*>(combo->GetPopupControl()->GetControl());
         ASSERT_NE(tree, nullptr);
-        wxTreeItemIdValue cookie;
-        wxTreeItemId drive = tree->GetFirstChild(tree->GetRootItem(), cookie);
-        for (int i = 0; i < n && drive.IsOk(); ++i)
-            drive = tree->GetNextChild(tree->GetRootItem(), cookie);
-        ASSERT_TRUE(drive.IsOk());
-        EXPECT_EQ(tree->GetItemText(drive), wxString::Format("PHYSICALDRIVE%d", n));
-        wxRect label;
-        ASSERT_TRUE(tree->GetBoundingRect(drive, label, true));
-        ClickAt(tree, label.GetPosition() + label.GetSize() / 2);
-    }
-
-    // A real click (through the X server) at a point of a window.
-    static void ClickAt(wxWindow* window, const wxPoint& point)
-    {
-        wxUIActionSimulator mouse;
-        mouse.MouseMove(window->ClientToScreen(point));
-        gui::Pump(100);
-        mouse.MouseClick();
-        gui::Pump(300);
+        gui::ClickAt(tree, gui::LabelCentre(tree, wxString::Format("PHYSICALDRIVE%d", n)));
     }
 
     // A picture of a window as the screen shows it, for the README. A
@@ -116,7 +97,7 @@ TEST_F(HostSessionTest, ToolbarOpensThePanelAndAChosenDriveListsItsRecordings)
     ASSERT_NE(bar, nullptr);
 
     const wxRect tool = bar->GetToolRect(iEVT_REMOTEPLAY_TOOLBAR);
-    ClickAt(bar, tool.GetPosition() + tool.GetSize() / 2);
+    gui::ClickAt(bar, tool.GetPosition() + tool.GetSize() / 2);
     auto* list = dynamic_cast<wxListCtrl*>(wxWindow::FindWindowById(1012));
     auto* combo = dynamic_cast<wxComboCtrl*>(wxWindow::FindWindowById(1011));
     ASSERT_NE(list, nullptr) << "the toolbar tool did not open the panel";
@@ -199,7 +180,7 @@ TEST_F(HostSessionTest, ActivatedRowPlaysInTheCanvasAndTheTransportCommandsReach
     for (const auto& [id, speed] : buttons) {
         wxWindow* button = wxWindow::FindWindowById(id, dialog);
         ASSERT_NE(button, nullptr);
-        ClickAt(button, wxPoint(15, 15));
+        gui::ClickAt(button, wxPoint(15, 15));
         std::vector<int> commands;
         for (const HostEventRecord& r : EventManager::Get()->History())
             if (r.type == iEVT_HDD_COMMAND)
@@ -207,9 +188,9 @@ TEST_F(HostSessionTest, ActivatedRowPlaysInTheCanvasAndTheTransportCommandsReach
         ASSERT_FALSE(commands.empty());
         EXPECT_EQ(commands.back(), speed) << "button " << id;
     }
-    ClickAt(wxWindow::FindWindowById(1030, dialog), wxPoint(15, 15));  // stop
+    gui::ClickAt(wxWindow::FindWindowById(1030, dialog), wxPoint(15, 15));  // stop
     EXPECT_EQ(EventManager::Get()->History().back().type, iEVT_HDD_DISCONNECTED);
-    ClickAt(wxWindow::FindWindowById(1033, dialog), wxPoint(15, 15));  // to the file player
+    gui::ClickAt(wxWindow::FindWindowById(1033, dialog), wxPoint(15, 15));  // to the file player
     EXPECT_FALSE(dialog->IsShown());
     EXPECT_EQ(EventManager::Get()->History().back().type, QRIX_START_FILEPLAY);
     // The host's file player plays the same recording in a window of its own.
@@ -222,12 +203,12 @@ TEST_F(HostSessionTest, ActivatedRowPlaysInTheCanvasAndTheTransportCommandsReach
     gui::Pump(600);
     EXPECT_GT(player->canvas()->PicturesReceived(), 3);
     EXPECT_TRUE(player->canvas()->Caption().rfind("row 1 \u00B7 ", 0) == 0) << player->canvas()->Caption();
-    ClickAt(player->playPause(), wxPoint(10, 10));  // pause: the picture holds
+    gui::ClickAt(player->playPause(), wxPoint(10, 10));  // pause: the picture holds
     const int held = player->canvas()->PicturesReceived();
     gui::Pump(400);
     EXPECT_EQ(player->canvas()->PicturesReceived(), held);
     EXPECT_EQ(player->playPause()->GetLabel(), "Play");
-    ClickAt(player->playPause(), wxPoint(10, 10));
+    gui::ClickAt(player->playPause(), wxPoint(10, 10));
     gui::Pump(400);
     EXPECT_GT(player->canvas()->PicturesReceived(), held);
 }
