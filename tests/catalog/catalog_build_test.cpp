@@ -7,7 +7,6 @@
 #include "catalog/build_summary.h"
 #include "catalog/catalog_reader.h"
 #include "tests/support/disk_fixture.h"
-#include "tests/support/io_trace.h"
 #include "tests/support/time_zone.h"
 #include "tools/dvrfs/disk_check.h"
 
@@ -160,19 +159,6 @@ INSTANTIATE_TEST_SUITE_P(
         OddAdapterCase{"NewestPositionBeyondTheRing", [](Layout& l) { l.lastListIdx = 16 + 1; }}),
     CaseName<OddAdapterCase>);
 
-TEST_F(CatalogBuildTest, NegativePositionsAreSkippedWithoutAReadAndAHugeSpanIsCutTo16Bits)
-{
-    const std::string path = WriteListed({0, 1, 2});
-    ASSERT_EQ(Build(path), CatalogBuild::kBuilt);
-    // A span from position -70000 to 2: only 0, 1 and 2 can be read.
-    reader_.m_volume->adapter->FirstList.Idx = -70000;
-    iotrace::Reset();
-    reader_.Setplaylist();
-    EXPECT_EQ(Indices(), (std::vector<int>{0, 1, 2}));
-    EXPECT_EQ(reader_.m_catalog->SpanCount, (70003 & 0xFFFF));
-    EXPECT_EQ(iotrace::Reads(path).size(), 3u);
-}
-
 TEST_F(CatalogBuildTest, NewestBelowZeroAndBelowTheOldestCountsAsWrapped)
 {
     const std::string path = WriteListed({3, 4, 5});  // a ring of 16
@@ -188,34 +174,6 @@ TEST_F(CatalogBuildTest, NewestBelowZeroAndBelowTheOldestCountsAsWrapped)
     EXPECT_EQ(reader_.m_recordCount, 0);
     EXPECT_EQ(reader_.m_catalog->SpanCount, 77);
     EXPECT_EQ(reader_.m_catalog->Entries[0].Idx, -1);
-}
-
-TEST_F(CatalogBuildTest, SecondBuildReplacesTheFirstAndAFailedOneEmptiesIt)
-{
-    const std::string first = WriteListed({0, 1, 2, 3, 4}, SmallLayout(), "first.img");
-    const std::string second = WriteListed({7, 8}, SmallLayout(), "second.img");
-    ASSERT_EQ(Build(first), CatalogBuild::kBuilt);
-    RecordCatalog* catalog = reader_.m_catalog;
-
-    ASSERT_EQ(Build(second), CatalogBuild::kBuilt);
-    EXPECT_EQ(reader_.m_catalog, catalog);
-    EXPECT_EQ(Indices(), (std::vector<int>{7, 8}));
-    EXPECT_EQ(catalog->Entries[2].Idx, -1);
-    EXPECT_EQ(catalog->Entries[2].StartTime, 0);
-    EXPECT_STREQ(catalog->Entries[2].DateText, "1970/01/01");  // texts of the first build stay
-
-    EXPECT_EQ(Build(dir_ + "/missing.img"), CatalogBuild::kNotOpened);
-    EXPECT_EQ(Indices(), (std::vector<int>{}));
-    EXPECT_EQ(catalog->Entries[0].Idx, -1);
-    ASSERT_EQ(Build(second), CatalogBuild::kBuilt);
-
-    Layout unconfigured = SmallLayout();
-    unconfigured.version = 0;
-    EXPECT_EQ(Build(WriteDisk(unconfigured, {}, {}, "blank.img")), CatalogBuild::kNotConfigured);
-    Layout noAdapter = SmallLayout();
-    noAdapter.adapterRuns.clear();
-    EXPECT_EQ(Build(WriteDisk(noAdapter, {}, {}, "empty.img")), CatalogBuild::kNoAdapter);
-    EXPECT_EQ(Indices(), (std::vector<int>{}));
 }
 
 // What the panel's status line says of a build, in plain words (the failures

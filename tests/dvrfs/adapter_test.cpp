@@ -58,18 +58,6 @@ INSTANTIATE_TEST_SUITE_P(
 
 class AdapterTest : public DiskTest {};
 
-TEST_F(AdapterTest, SlotWithAZeroSumButAnotherNumberEndsTheRun)
-{
-    Layout layout = SmallLayout();
-    layout.adapterRuns = {{0, 10}};
-    const std::string path = WriteDisk(layout, {});
-    const std::vector<char> zeros(512);
-    image_->WriteLogical(5 * 4096, zeros.data(), zeros.size());  // XOR 0, Idx 0
-    Refingerprint(path);
-    ASSERT_EQ(OpenAndSearch(path), 1);
-    EXPECT_EQ(Adapter().Idx, 4);
-}
-
 TEST_F(AdapterTest, AdapterWhoseRingsAreLargerThanAnyRecordersIsRefused)
 {
     Layout list = SmallLayout();

@@ -52,23 +52,6 @@ TEST_F(RawReadTest, ReadsWholeSectorsAndDeliversExactlyTheBytesAskedFor)
     EXPECT_EQ(reads[1].count, 512u);
 }
 
-TEST_F(RawReadTest, ShortReadZeroFillsWhatTheDeviceDidNotDeliver)
-{
-    OpenPatternFile(1000);
-    std::vector<unsigned char> dest(100, 0xAA);
-
-    ASSERT_EQ(reader_.HddataRead(&file_, reinterpret_cast<char*>(dest.data()), 950, 100), 1);
-    for (int i = 0; i < 50; ++i)
-        EXPECT_EQ(dest[i], PatternByte(950 + i));
-    for (int i = 50; i < 100; ++i)
-        EXPECT_EQ(dest[i], 0) << i;
-
-    // Nothing at all to read: a failure, and the destination stays as it was.
-    std::fill(dest.begin(), dest.end(), 0xAA);
-    EXPECT_EQ(reader_.HddataRead(&file_, reinterpret_cast<char*>(dest.data()), 4096, 100), -1);
-    EXPECT_EQ(dest[0], 0xAA);
-}
-
 TEST_F(RawReadTest, RefusesWhatCannotBeReadWithoutTouchingTheDestination)
 {
     OpenPatternFile(4096);

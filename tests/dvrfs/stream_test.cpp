@@ -52,26 +52,6 @@ protected:
 
 using Frames = std::vector<std::pair<int, int>>;
 
-// Forward: each frame, then the next block's first; backward: entry 0, then
-// the previous block's last entry.
-TEST_F(StreamTest, EachFrameThenTheNextOrPreviousBlock)
-{
-    path_ = WriteDisk(SmallLayout(), {GeneratedRecording(0, 0, 1, 100, 200, 8, 3, kFrameSize)});
-    Search();
-    Place(0, 0);
-    Frames got;
-    for (int i = 0; i < 4; ++i)
-        got.push_back(Forward());
-    EXPECT_EQ(got, (Frames{{0, 0}, {0, 1}, {0, 2}, {1, 0}}));
-    EXPECT_EQ(reader_.m_streamBlock, 1);
-    EXPECT_EQ(reader_.m_streamFrame, 1);
-    Place(1, 0);
-    EXPECT_EQ(Backward(), std::make_pair(1, 0));
-    EXPECT_EQ(reader_.m_streamFrame, -1);
-    EXPECT_EQ(Backward(), std::make_pair(0, 2));
-    EXPECT_EQ(Backward(), std::make_pair(0, 1));
-}
-
 TEST_F(StreamTest, ForwardPassesOverABlockWithoutFrames)
 {
     Recording r = GeneratedRecording(0, 0, 2, 100, 200, 8, 1, kFrameSize);

@@ -1,9 +1,8 @@
 // Opening a disk: superblock and block table verification, the backup path,
-// the error register, and the queries on an open volume.
+// the error register, and the fill level of an open volume.
 #include <fcntl.h>
 #include <unistd.h>
 
-#include <cstring>
 #include <filesystem>
 #include <fstream>
 
@@ -111,19 +110,6 @@ INSTANTIATE_TEST_SUITE_P(
     CaseName<OpenCase>);
 
 class VolumeOpenTest : public DiskTest {};
-
-TEST_F(VolumeOpenTest, ValidDiskOpensWithCatalogueAndPartitionCopyAndCleanRegister)
-{
-    ASSERT_EQ(Open(WriteDisk(SmallLayout(), {})), 1);
-    EXPECT_STREQ(reader_.m_errorText, "");
-    ASSERT_NE(reader_.m_catalog, nullptr);
-    EXPECT_EQ(reader_.m_catalog->Opened, 1);
-    EXPECT_EQ(reader_.m_volume->blockTable.size(), 5u);  // the table and a terminating entry
-    ASSERT_NE(reader_.m_volume->partitionEntry, nullptr);
-    const unsigned char expected[16] = {0x00, 0xFE, 0xFF, 0xFF, 0x83, 0xFE, 0xFF, 0xFF,
-                                        0x00, 0x08, 0x00, 0x00, 0x00, 0x00, 0x10, 0x00};
-    EXPECT_EQ(std::memcmp(reader_.m_volume->partitionEntry->data(), expected, 16), 0);
-}
 
 TEST_F(VolumeOpenTest, UnreadableSuperBlocksAreRefusedWithoutAllocatingTheirTable)
 {
