@@ -14,7 +14,6 @@ using dvrimage::Frame;
 using dvrimage::GeneratedRecording;
 using dvrimage::Layout;
 using dvrimage::Recording;
-using dvrimage::Target;
 
 constexpr std::size_t kFrameSize = 100;
 
@@ -83,39 +82,6 @@ TEST_F(StreamTest, ForwardRunsAcrossTheEndOfTheRingThenRestartsAtTheOldestRecord
     expected.push_back({10, 0});  // past the range: the oldest recording's first block
     EXPECT_EQ(got, expected);
     EXPECT_EQ(reader_.m_streamBlock, 10);
-}
-
-TEST_F(StreamTest, BackwardBeforeTheOldestRecordingRestartsAtTheEndOfTheNewest)
-{
-    path_ = WriteDisk(SmallLayout(), {GeneratedRecording(0, 2, 3, 100, 200, 8, 3, kFrameSize),
-                                      GeneratedRecording(1, 4, 5, 300, 400, 8, 3, kFrameSize)});
-    Search();
-    Place(2, 0);
-    EXPECT_EQ(Backward(), std::make_pair(2, 0));
-    EXPECT_EQ(Backward(), std::make_pair(5, 2));
-    EXPECT_EQ(reader_.m_streamBlock, 5);
-}
-
-TEST_F(StreamTest, DamagedBlockOrCursorFailsTheCallWithTheReadsCode)
-{
-    Layout layout = SmallLayout();
-    layout.adapterRecordsFrame = false;  // so that the damaged newest entry does not fail the search
-    path_ = WriteDisk(layout, {GeneratedRecording(0, 0, 2, 100, 200, 8, 1, kFrameSize)},
-                      {{Target::BlockHeader, 1}, {Target::IndexEntry, 2, 0}});
-    Search();
-
-    Place(0, 0);
-    EXPECT_EQ(Forward(), std::make_pair(0, 0));
-    EXPECT_EQ(Forward(), std::make_pair(-1, -1));
-    EXPECT_EQ(reader_.m_errorCode, 52);
-    EXPECT_EQ(reader_.m_streamBlock, 1);  // already advanced
-    EXPECT_EQ(reader_.m_streamFrame, 0);
-    Place(2, 0);
-    EXPECT_EQ(Forward(), std::make_pair(-1, -1));
-    EXPECT_EQ(reader_.m_errorCode, 53);
-    Place(-3, 0);
-    EXPECT_EQ(Forward(), std::make_pair(-1, -1));
-    EXPECT_EQ(reader_.m_errorCode, 69);
 }
 
 TEST_F(StreamTest, RingWithoutAnyFrameEndsTheWalkInsteadOfCirclingForever)
