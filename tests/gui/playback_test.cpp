@@ -1,7 +1,5 @@
 // Playing a recording and the transport buttons, as the host hears them:
 // events in the event manager's record, frame manager and canvas calls.
-#include <arpa/inet.h>
-
 #include "tests/gui/panel_fixture.h"
 
 namespace {
@@ -76,13 +74,11 @@ TEST_F(PlaybackTest, FirstPlayConnectsAndStartsADecoderForTheAnsweredChannels)
 {
     EXPECT_EQ(Play(1), (Lines{"connect 127.0.0.1 #1"}));
     EXPECT_EQ(Events(iEVT_HDD_CONNECTED)[0].id, iEVT_MORVANE_WINDOW);
-    EXPECT_TRUE(FrameManager::Get()->Calls().empty());
     ASSERT_NE(panel_->m_decoder, nullptr);
     EXPECT_EQ(*panel_->m_decoder->m_filePath, panel_->m_diskPath);
     EXPECT_EQ(CanvasCalls(), (std::vector<K>{K::kReset, K::kOn}));
     EXPECT_EQ(panel_->m_glPane->Calls()[1].address, 0x7F000001u);
     EXPECT_EQ(CSoundout::Get()->Routes(), (std::vector<std::pair<int, int>>{{0, 0}}));
-    EXPECT_EQ(panel_->m_playState, 0);
 
     panel_->m_catalog->Entries[0].Idx = 70000;  // the record number is the low 16 bits of the list index
     EXPECT_EQ(Play(0), (Lines{"disconnect 127.0.0.1 #1", "connect 127.0.0.1 #4464"}));
@@ -96,12 +92,10 @@ TEST_F(PlaybackTest, SecondPlayTakesDownTheFirstChannelByChannel)
     EXPECT_EQ(Play(2), (Lines{"disconnect 127.0.0.1 #0", "connect 127.0.0.1 #2"}));
     const std::vector<FrameManager::Call>& calls = FrameManager::Get()->Calls();
     ASSERT_EQ(calls.size(), 8u);
-    for (int channel = 0; channel < 4; ++channel) {
-        EXPECT_FALSE(calls[2 * channel].sound);
-        EXPECT_TRUE(calls[2 * channel + 1].sound);
-        EXPECT_EQ(calls[2 * channel].channel, channel);
-        EXPECT_EQ(calls[2 * channel].operation, 2);
-        EXPECT_EQ(calls[2 * channel].address, static_cast<std::uint32_t>(inet_addr("127.0.0.1")));
+    for (std::size_t k = 0; k < calls.size(); ++k) {
+        EXPECT_EQ(calls[k].channel, static_cast<int>(k / 2));
+        EXPECT_EQ(calls[k].sound, k % 2 == 1);
+        EXPECT_EQ(calls[k].operation, 2);  // stop
     }
     EXPECT_EQ(CanvasCalls(), (std::vector<K>{K::kReset, K::kOn, K::kOff, K::kReset, K::kOn}));
     EXPECT_EQ(panel_->m_glPane->Calls()[2].count, 4);
