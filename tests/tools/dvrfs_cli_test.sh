@@ -266,6 +266,12 @@ if command -v ewfacquire >/dev/null; then
 image_media_size=$(stat -c %s "$work/wrapped.img")" "$("$dvrfs" info "$work/case.E01" | grep -E '^image(_media_size)?=')"
 fi
 
+# --- a raw image in numbered pieces: read as the disk, its pieces counted
+dd if="$work/one.img" of="$work/one.001" bs=1M count=64 conv=sparse status=none
+dd if="$work/one.img" of="$work/one.002" bs=1M skip=64 conv=sparse status=none
+check "list of the split image is the list of the disk" "$("$dvrfs" list "$work/one.img")" "$("$dvrfs" list "$work/one.001")"
+check "info names the split image" "image=split raw image, 2 pieces" "$("$dvrfs" info "$work/one.001" | grep '^image=')"
+
 # --- report
 "$dvrfs" report "$work/clip.img" -o "$work/report" >/dev/null
 check "report: an HTML page with a picture of each recording" 2 "$(grep -o '<img alt="row [0-9]*" src="data:image/png;base64,' "$work/report/report.html" | wc -l)"
