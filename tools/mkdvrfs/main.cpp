@@ -9,6 +9,7 @@
 #include <iterator>
 #include <sstream>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "tools/dvrimage/dvr_image.h"
@@ -111,6 +112,15 @@ long long Number(const char* text, const std::string& what)
     if (v.size() != 1)
         UsageError("expected one number for " + what);
     return v[0];
+}
+
+// Two numbers A:B, or a usage error naming the option's form.
+std::pair<long long, long long> NumberPair(const char* text, const std::string& option, const std::string& form)
+{
+    const std::vector<long long> v = Numbers(text, option);
+    if (v.size() != 2)
+        UsageError(option + " takes " + form);
+    return {v[0], v[1]};
 }
 
 RecordingArg ParseRecording(const std::string& text)
@@ -254,13 +264,11 @@ int main(int argc, char** argv)
         case kListMax: layout.listMax = static_cast<std::int32_t>(Number(optarg, "--list-max")); break;
         case kDataBlocks: layout.dataBlockMax = static_cast<std::int32_t>(Number(optarg, "--data-blocks")); break;
         case kAdapterRun: {
-            const std::vector<long long> v = Numbers(optarg, "--adapter-run");
-            if (v.size() != 2)
-                UsageError("--adapter-run takes START:LENGTH");
+            const auto [start, length] = NumberPair(optarg, "--adapter-run", "START:LENGTH");
             if (!runsGiven)
                 layout.adapterRuns.clear();
             runsGiven = true;
-            layout.adapterRuns.push_back({static_cast<int>(v[0]), static_cast<int>(v[1])});
+            layout.adapterRuns.push_back({static_cast<int>(start), static_cast<int>(length)});
             break;
         }
         case kVersion: layout.version = static_cast<std::int32_t>(Number(optarg, "--version")); break;
@@ -269,11 +277,9 @@ int main(int argc, char** argv)
         case kMirrorAt: layout.listOffsetBackup = static_cast<std::uint64_t>(Number(optarg, "--mirror-at")); break;
         case kDataRingAt: layout.dataBlockOffset = static_cast<std::uint64_t>(Number(optarg, "--data-ring-at")); break;
         case kListSpan: {
-            const std::vector<long long> v = Numbers(optarg, "--list-span");
-            if (v.size() != 2)
-                UsageError("--list-span takes FIRST:LAST");
-            layout.firstListIdx = static_cast<std::int32_t>(v[0]);
-            layout.lastListIdx = static_cast<std::int32_t>(v[1]);
+            const auto [first, last] = NumberPair(optarg, "--list-span", "FIRST:LAST");
+            layout.firstListIdx = static_cast<std::int32_t>(first);
+            layout.lastListIdx = static_cast<std::int32_t>(last);
             break;
         }
         case kRecording: recordings.push_back(ParseRecording(optarg)); break;
