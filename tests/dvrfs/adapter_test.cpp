@@ -80,7 +80,7 @@ TEST_F(AdapterTest, EmptyRingsAreAcceptedAndNothingDividesByThem)
     layout.firstListIdx = 3;
     layout.lastListIdx = 2;  // claims recordings in a ring of none
     EXPECT_EQ(OpenAndSearch(WriteDisk(layout, {})), -1);  // the refresh cannot read an entry of an empty ring
-    EXPECT_EQ(reader_.m_errorCode, 65);               // and so finds no oldest entry to read
+    EXPECT_EQ(reader_.m_errorCode, 65);                   // and so finds no oldest entry to read
     ASSERT_NE(reader_.m_volume->adapter, nullptr);
     _HisiHeader_t header{};
     std::vector<unsigned char> payload(16);

@@ -1,9 +1,7 @@
-// A hostile or failing disk: read-only access, bounded work on the worst
-// disks the writer can make, and a medium that fails under the reader.
+// A hostile or failing disk: bounded work on the worst disks the writer can
+// make, and a medium that fails under the reader.
 #include <sys/resource.h>
-#include <sys/stat.h>
 
-#include <climits>
 #include <cstdio>
 #include <filesystem>
 
