@@ -1,5 +1,6 @@
-// Reading the recorded stream back: one frame per call, forward and backward
-// across blocks and across the end of the data ring, and runs of frames.
+// Reading the recorded stream back one frame per call: past blocks without
+// frames, across the end of the data ring, at the far end of a terabyte
+// disk, round a ring with no frame at all; and runs of frames.
 #include <sys/stat.h>
 
 #include <climits>
