@@ -51,6 +51,13 @@ std::int32_t RingSlot(std::int64_t n, std::int32_t ring)
     return static_cast<std::int32_t>(ring > 0 ? ((n % ring) + ring) % ring : n);
 }
 
+// A recording's end block counted on from its start without wrapping: an end
+// below the start lies one turn of the ring further on.
+std::int64_t UnwrappedEnd(std::int32_t first, std::int32_t last, std::int32_t ring)
+{
+    return last < first ? std::int64_t{last} + ring : last;
+}
+
 void Fail(const std::string& what)
 {
     throw std::system_error(errno, std::generic_category(), what);
@@ -107,7 +114,7 @@ Recording GeneratedRecording(std::int32_t listIdx, std::int32_t startBlock, std:
     r.endBlock = endBlock;
     r.startTime = startTime;
     r.endTime = endTime;
-    const std::int64_t last = endBlock < startBlock ? std::int64_t{endBlock} + ringBlocks : endBlock;
+    const std::int64_t last = UnwrappedEnd(startBlock, endBlock, ringBlocks);
     for (std::int64_t n = startBlock; n <= last; ++n) {
         std::vector<Frame> frames;
         for (int k = 0; k < framesPerBlock; ++k)
@@ -121,11 +128,8 @@ void FillWithFrames(Recording& recording, std::int32_t ringBlocks, int framesPer
                     const std::vector<std::vector<std::uint8_t>>& frames, std::size_t& next)
 {
     recording.blocks.clear();
-    const std::int64_t first = recording.startBlock;
-    std::int64_t last = recording.endBlock;
-    if (last < first)
-        last += ringBlocks;
-    for (std::int64_t n = first; n <= last && !frames.empty(); ++n) {
+    const std::int64_t last = UnwrappedEnd(recording.startBlock, recording.endBlock, ringBlocks);
+    for (std::int64_t n = recording.startBlock; n <= last && !frames.empty(); ++n) {
         std::vector<Frame> block;
         for (int k = 0; k < framesPerBlock; ++k, next = (next + 1) % frames.size())
             block.push_back(Frame{frames[next], 1});
