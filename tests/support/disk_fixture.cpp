@@ -86,7 +86,23 @@ void DiskTest::TearDown()
                 << path << " was opened for more than reading";
     }
     iotrace::Reset();
+    KeepDisks();
     std::filesystem::remove_all(dir_);
+}
+
+// With MORVANE_KEEP_DISKS naming a folder, each image this test wrote stays
+// there as a hard link (sparse as written) for the golden answers' capture.
+void DiskTest::KeepDisks()
+{
+    const char* keep = std::getenv("MORVANE_KEEP_DISKS");
+    if (!keep || !*keep)
+        return;
+    const std::string prefix = "dvrfs-test-" + std::to_string(::getpid()) + "-";
+    const std::string test = std::filesystem::path(dir_).filename().string().substr(prefix.size());
+    for (const auto& entry : fingerprints_) {
+        const std::string name = test + "-" + std::filesystem::path(entry.first).filename().string();
+        ::link(entry.first.c_str(), (std::string(keep) + "/" + name).c_str());
+    }
 }
 
 std::string DiskTest::WriteImage(dvrimage::DiskImage& image, const std::string& name)

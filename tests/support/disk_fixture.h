@@ -77,6 +77,7 @@ protected:
     std::unique_ptr<dvrimage::DiskImage> image_;
 
 private:
+    void KeepDisks();
     std::map<std::string, std::string> fingerprints_;
 };
 

@@ -8,6 +8,21 @@ dvrfs=$2
 clip=$3
 work=$(mktemp -d)
 trap 'rm -rf "$work"' EXIT
+# With MORVANE_KEEP_DISKS naming a folder, a copy of each disk written here
+# stays there, numbered in the order written, for the golden answers.
+if [ -n "${MORVANE_KEEP_DISKS:-}" ]; then
+  cat >"$work/mkdvrfs-kept" <<KEEP
+#!/usr/bin/env bash
+"$mkdvrfs" "\$@"; status=\$?
+out=\${*: -1}
+if [ \$status -eq 0 ] && [ -f "\$out" ]; then
+  cp --sparse=always "\$out" "$MORVANE_KEEP_DISKS/cli-\$(ls "$MORVANE_KEEP_DISKS" | grep -c '^cli-')-\$(basename "\$out")"
+fi
+exit \$status
+KEEP
+  chmod +x "$work/mkdvrfs-kept"
+  mkdvrfs=$work/mkdvrfs-kept
+fi
 failures=0
 checks=0
 
