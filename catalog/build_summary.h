@@ -12,11 +12,10 @@
 #include "catalog/catalog_reader.h"
 
 // For example "4 recordings, 2023-11-14 22:13 to 2023-11-15 02:13 (local
-// time); 1 damaged entry skipped", "cannot open: Permission denied — reading
-// a raw disk needs membership of the disk group", or "not a recorder disk
-// (both superblocks damaged)". `reader` is the one that ran the build on
-// `path`, as it was left.
-std::string DescribeBuild(CatalogBuild result, const CatalogReader& reader, const std::string& path);
+// time); 1 damaged entry skipped", or, for a disk that could not be read, why
+// (the open's status in its own words). `reader` is the one that ran the
+// build, as it was left.
+std::string DescribeBuild(const CatalogReader& reader);
 
 // List positions (ascending) as runs, "2, 6, 9-40", at most `maxRuns` of
 // them and then how many there are in all: a ring of a million damaged

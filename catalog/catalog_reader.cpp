@@ -4,15 +4,22 @@
 #include <cstdio>
 #include <ctime>
 
-CatalogBuild CatalogReader::BuildCatalog(const wxString& path)
+CatalogBuild BuildOutcome(const dvrfs::VolumeStatus& status)
 {
-    CatalogBuild result = CatalogBuild::kBuilt;
-    if (OpenDVRFS(path) <= 0)
-        result = CatalogBuild::kNotOpened;
-    else if (Checkconfig() <= 0)
-        result = CatalogBuild::kNotConfigured;
-    else if (BlockOpe(m_diskFile, 2, nullptr, 0, 0) < 0)
-        result = CatalogBuild::kNoAdapter;
+    switch (status.stage) {
+    case dvrfs::OpenStage::kSource:
+    case dvrfs::OpenStage::kSuperBlock: return CatalogBuild::kNotOpened;
+    case dvrfs::OpenStage::kConfiguration: return CatalogBuild::kNotConfigured;
+    case dvrfs::OpenStage::kAdapter:
+    case dvrfs::OpenStage::kRefresh: return CatalogBuild::kNoAdapter;
+    case dvrfs::OpenStage::kReady: break;
+    }
+    return CatalogBuild::kBuilt;
+}
+
+CatalogBuild CatalogReader::BuildCatalog(const std::string& path)
+{
+    const CatalogBuild result = BuildOutcome(OpenVolume(path));
     if (result != CatalogBuild::kBuilt) {
         ClearEntries();
         return result;
@@ -27,9 +34,12 @@ void CatalogReader::ClearEntries()
     m_recordCount = 0;
     m_rowPositions.clear();
     m_skippedPositions.clear();
-    if (!m_catalog)
+    m_unwrittenPositions.clear();
+    m_newestBlockUnreadableRow = -1;
+    RecordCatalog* catalog = MutableCatalog();
+    if (!catalog)
         return;
-    for (CatalogEntry& entry : m_catalog->Entries) {
+    for (CatalogEntry& entry : catalog->Entries) {
         entry.Idx = -1;
         entry.StartTime = 0;
         entry.EndTime = 0;
@@ -38,19 +48,20 @@ void CatalogReader::ClearEntries()
 
 void CatalogReader::Setplaylist()
 {
-    if (!m_catalog || !m_volume || !m_volume->adapter)
+    RecordCatalog* catalog = MutableCatalog();
+    if (!catalog || !Adapter())
         return;
     ClearEntries();
 
     // The list is a ring: a newest position below the oldest has wrapped.
-    const _HisiAdapter_t& adapter = *m_volume->adapter;
+    const _HisiAdapter_t& adapter = *Adapter();
     const std::int64_t ringSize = adapter.ListMax;
     const std::int64_t first = adapter.FirstList.Idx;
     std::int64_t last = adapter.LastList.Idx;
     if (last < first)
         last += ringSize;
     if (last >= 0)
-        m_catalog->SpanCount = static_cast<std::uint16_t>(last - first + 1);
+        catalog->SpanCount = static_cast<std::uint16_t>(last - first + 1);
     m_rowPositions.reserve(kCatalogCapacity);
     if (last < first || ringSize <= 0)
         return;
@@ -62,30 +73,60 @@ void CatalogReader::Setplaylist()
     const std::int64_t from = std::max<std::int64_t>(first, 0);
     const std::int64_t to = std::min(last, from + ringSize - 1);
     for (std::int64_t p = from; p <= to && m_recordCount < kCatalogCapacity; ++p) {
-        const std::int64_t position = p % ringSize;
+        const std::int32_t position = static_cast<std::int32_t>(p % ringSize);
         _HisiList_t record{};
-        if (BlockOpe(m_diskFile, 33, &record, position, 1) < 0) {
-            m_skippedPositions.push_back(static_cast<std::int32_t>(position));
+        const dvrfs::ListEntryState state = ReadListEntry(position, &record);
+        if (state == dvrfs::ListEntryState::kUnwritten) {
+            m_unwrittenPositions.push_back(position);
             continue;
         }
-        FillEntry(m_catalog->Entries[m_recordCount], record);
-        m_rowPositions.push_back(static_cast<std::int32_t>(position));
+        if (state != dvrfs::ListEntryState::kSound && state != dvrfs::ListEntryState::kRepaired) {
+            m_skippedPositions.push_back(position);
+            continue;
+        }
+        FillEntry(catalog->Entries[m_recordCount], record);
+        m_rowPositions.push_back(position);
         ++m_recordCount;
     }
+    // A recorder whose newest position is still negative has recorded
+    // nothing: the span it names holds no entry, not damaged ones.
+    if (adapter.LastList.Idx < 0 && m_recordCount == 0) {
+        m_skippedPositions.clear();
+        m_unwrittenPositions.clear();
+        catalog->SpanCount = 0;
+        return;
+    }
     CollectSkippedPositions();
+    MarkNewestBlockUnreadable();
 }
 
-// Adds the damaged entries the adapter refresh met at either end of the
-// recorder's span: the refresh narrowed the span to its readable entries, so
-// the walk above never reaches them, but they are recordings all the same.
+namespace {
+
+void AddSorted(std::vector<std::int32_t>& positions, const std::vector<std::int32_t>& more)
+{
+    positions.insert(positions.end(), more.begin(), more.end());
+    std::sort(positions.begin(), positions.end());
+    positions.erase(std::unique(positions.begin(), positions.end()), positions.end());
+}
+
+}  // namespace
+
+// Adds the entries the adapter refresh met at either end of the recorder's
+// span: the refresh narrowed the span to its readable entries, so the walk
+// above never reaches them, but they are recordings (or blank) all the same.
 void CatalogReader::CollectSkippedPositions()
 {
-    const std::vector<std::int32_t>& unreadable = m_volume->unreadableListPositions;
-    m_skippedPositions.reserve(m_skippedPositions.size() + unreadable.size());
-    m_skippedPositions.insert(m_skippedPositions.end(), unreadable.begin(), unreadable.end());
-    std::sort(m_skippedPositions.begin(), m_skippedPositions.end());
-    m_skippedPositions.erase(std::unique(m_skippedPositions.begin(), m_skippedPositions.end()),
-                             m_skippedPositions.end());
+    AddSorted(m_skippedPositions, Volume()->unreadableListPositions);
+    AddSorted(m_unwrittenPositions, Volume()->unwrittenListPositions);
+}
+
+void CatalogReader::MarkNewestBlockUnreadable()
+{
+    if (!Volume()->newestBlockUnreadable)
+        return;
+    const auto newest = std::find(m_rowPositions.begin(), m_rowPositions.end(), Adapter()->LastList.Idx);
+    if (newest != m_rowPositions.end())
+        m_newestBlockUnreadableRow = static_cast<std::int32_t>(newest - m_rowPositions.begin());
 }
 
 namespace {

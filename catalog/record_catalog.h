@@ -14,6 +14,11 @@ struct CatalogEntry {
     std::int32_t EndTime;
     char DateText[24];       // "%04d/%02d/%02d" of StartTime, UTC
     char TimeText[24];       // "%02d:%02d:%02d-%02d:%02d:%02d" of both times, UTC
+
+    // The times as the recorder wrote them, unsigned: every text made of an
+    // entry reads them here, so that a time past 2038 stays in its century.
+    std::uint32_t StartSeconds() const { return static_cast<std::uint32_t>(StartTime); }
+    std::uint32_t EndSeconds() const { return static_cast<std::uint32_t>(EndTime); }
 };
 
 struct RecordCatalog {

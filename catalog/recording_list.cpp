@@ -10,7 +10,7 @@
 namespace {
 
 // Seconds since 1970 (UTC) as the workstation's local date and time.
-wxString LocalDateTime(std::int32_t seconds)
+wxString LocalDateTime(std::uint32_t seconds)
 {
     const wxDateTime when(wxLongLong(seconds) * 1000);
     const wxDateTime::Tm tm = when.GetTm(wxDateTime::Local);
@@ -20,18 +20,20 @@ wxString LocalDateTime(std::int32_t seconds)
 }  // namespace
 
 // A build that fails empties the catalogue, and so the list: rows of the
-// disk chosen before must not stand under this one's name.
+// disk chosen before must not stand under this one's name, and the row
+// chosen before is no row of this disk: Play waits for a row to be chosen.
 void MorvanePlugConfig::SendHddList(int drive)
 {
     m_diskPath = DiskPathForDrive(drive);
-    const CatalogBuild result = BuildCatalog(wxString(m_diskPath));
+    m_currentRecord = -1;
+    BuildCatalog(std::string(m_diskPath.fn_str()));
     Setwxlist();
-    ShowBuildSummary(drive, result);
+    ShowBuildSummary(drive);
 }
 
-void MorvanePlugConfig::ShowBuildSummary(int drive, CatalogBuild result)
+void MorvanePlugConfig::ShowBuildSummary(int drive)
 {
-    const std::string summary = DescribeBuild(result, *this, m_diskPath.utf8_string());
+    const std::string summary = DescribeBuild(*this);
     const wxString text =
         wxString::Format("PHYSICALDRIVE%d (%s): %s", drive, m_diskPath, wxString::FromUTF8(summary.c_str()));
     // Two lines under the list and the buttons hold even a long image path.
@@ -45,11 +47,11 @@ void MorvanePlugConfig::Setwxlist()
     m_recordList->DeleteAllItems();
     m_recordList->Show(false);
     for (int i = 0; i < m_recordCount; ++i) {
-        const CatalogEntry& entry = m_catalog->Entries[i];
+        const CatalogEntry& entry = Catalog()->Entries[i];
         const long item = m_recordList->InsertItem(i, wxString::Format("%d.", i), 0);
-        m_recordList->SetItemData(item, entry.StartTime);
-        m_recordList->SetItem(item, 1, LocalDateTime(entry.StartTime), -1);
-        m_recordList->SetItem(item, 2, LocalDateTime(entry.EndTime), -1);
+        m_recordList->SetItemData(item, entry.StartSeconds());
+        m_recordList->SetItem(item, 1, LocalDateTime(entry.StartSeconds()), -1);
+        m_recordList->SetItem(item, 2, LocalDateTime(entry.EndSeconds()), -1);
     }
     m_recordList->Show(true);
 }

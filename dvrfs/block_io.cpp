@@ -6,8 +6,6 @@
 #include <cstring>
 #include <memory>
 
-#include <wx/log.h>
-
 #include "dvrfs/dvr_disk_reader.h"
 #include "dvrfs/error_places.h"
 #include "dvrfs/record_math.h"
@@ -26,13 +24,13 @@ wxUint64 PhysicalBlockStart(const _H264SuperBlock_t& super, wxInt64 block)
 
 }  // namespace
 
-int DvrDiskReader::HddataRead(wxFile* file, char* dest, wxUint64 offset, unsigned long length)
+int DvrDiskReader::ReadSectors(char* dest, wxUint64 offset, unsigned long length)
 {
     if (length == 0)
         return -1;
     // No record of the disk is longer than an int; a longer request is refused
     // before it can size an allocation.
-    if (!file || !dest || !file->IsOpened() || length > static_cast<unsigned long>(INT_MAX))
+    if (!m_source || !dest || length > static_cast<unsigned long>(INT_MAX))
         return -1;
     wxUint64 lastByte = 0;
     if (__builtin_add_overflow(offset, length - 1, &lastByte))
@@ -45,25 +43,23 @@ int DvrDiskReader::HddataRead(wxFile* file, char* dest, wxUint64 offset, unsigne
 
     const std::size_t span = (lastSector - firstSector + 1) * kSectorSize;
     std::unique_ptr<char[]> sectors(new char[span]);
-    long long got = 0;
-    if (m_imageSource) {
-        got = m_imageSource->Read(start, sectors.get(), span);
-    } else {
-        wxLogNull quiet;
-        if (file->Seek(static_cast<wxFileOffset>(start), wxFromStart) < 0)
-            return -1;
-        got = file->Read(sectors.get(), span);
-    }
-    if (got <= 0)
+    const long long got = m_source->Read(start, sectors.get(), span);
+    if (got <= 0) {
+        m_lastReadWhole = false;
         return -1;
+    }
     // Whatever a short read did not reach arrives as zeros.
-    std::memset(sectors.get() + got, 0, span - static_cast<std::size_t>(got));
+    if (static_cast<std::size_t>(got) < span) {
+        m_lastReadWhole = false;
+        std::memset(sectors.get() + got, 0, span - static_cast<std::size_t>(got));
+    }
     std::memcpy(dest, sectors.get() + (offset - start), length);
     return 1;
 }
 
-int DvrDiskReader::BlockRead(wxFile* file, wxInt64 position, char* dest, int length)
+int DvrDiskReader::ReadLogical(wxInt64 position, char* dest, int length)
 {
+    m_lastReadWhole = true;
     if (position < 0 || length < 0)
         return Refuse(kErrReadRange, kAtNegativeRead);
     if (length == 0)
@@ -80,7 +76,7 @@ int DvrDiskReader::BlockRead(wxFile* file, wxInt64 position, char* dest, int len
     const bool overflows = __builtin_add_overflow(position, static_cast<wxInt64>(length) - 1, &lastByte);
     const wxInt64 last = overflows ? INT64_MAX : lastByte >> super.BlockSizeShift;
     if (last >= super.BlockCount) {
-        SetErrorText(kErrReadBeyond,
+        SetErrorText(kErrReadBeyond, kAtReadBeyond,
                      "%s[%d]Pos=%" PRId64 ", Size=%d, OffsetAddressSpace=%" PRId64
                      ", OffsetBlockSpace=%" PRId64,
                      kFunctionWord, kAtReadBeyond, static_cast<std::int64_t>(position), length,
@@ -98,7 +94,7 @@ int DvrDiskReader::BlockRead(wxFile* file, wxInt64 position, char* dest, int len
     wxInt64 remaining = length;
     for (wxInt64 block = position >> super.BlockSizeShift; block <= last; ++block) {
         const wxInt64 chunk = block == last ? remaining : super.BlockSize - inside;
-        if (HddataRead(file, dest, PhysicalBlockStart(super, block) + inside, static_cast<unsigned long>(chunk)) < 0)
+        if (ReadSectors(dest, PhysicalBlockStart(super, block) + inside, static_cast<unsigned long>(chunk)) < 0)
             ClearRecords(dest, static_cast<int>(chunk));
         dest += chunk;
         remaining -= chunk;
@@ -107,7 +103,7 @@ int DvrDiskReader::BlockRead(wxFile* file, wxInt64 position, char* dest, int len
     return 1;
 }
 
-int DvrDiskReader::BlockShift(int block, wxInt64* result)
+int DvrDiskReader::PhysicalBlockOffset(int block, wxInt64* result)
 {
     if (!result || !HasVolume())
         return -1;
@@ -115,4 +111,21 @@ int DvrDiskReader::BlockShift(int block, wxInt64* result)
         return RefuseUnsoundGeometry();
     *result = static_cast<wxInt64>(PhysicalBlockStart(m_volume->superBlock, block));
     return 1;
+}
+
+// --- The operation-code entry points.
+
+int DvrDiskReader::HddataRead(wxFile* /*file*/, char* dest, wxUint64 offset, unsigned long length)
+{
+    return ReadSectors(dest, offset, length);
+}
+
+int DvrDiskReader::BlockRead(wxFile* /*file*/, wxInt64 position, char* dest, int length)
+{
+    return ReadLogical(position, dest, length);
+}
+
+int DvrDiskReader::BlockShift(int block, wxInt64* result)
+{
+    return PhysicalBlockOffset(block, result);
 }

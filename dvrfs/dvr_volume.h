@@ -27,8 +27,14 @@ struct DvrVolume {
     // The current adapter; null until the adapter search succeeds.
     std::unique_ptr<_HisiAdapter_t> adapter;
     // List positions of the adapter's span that the adapter refresh could read
-    // in neither the list ring nor its mirror, in the order it met them.
+    // in neither the list ring nor its mirror (damaged), in the order it met
+    // them.
     std::vector<std::int32_t> unreadableListPositions;
+    // Those whose two copies hold only zero bytes: entries never written.
+    std::vector<std::int32_t> unwrittenListPositions;
+    // The newest recording's newest block could not be read: the refresh
+    // kept the span and times it found.
+    bool newestBlockUnreadable = false;
     // The second partition slot of sector 0; null until the device opens.
     std::unique_ptr<std::array<char, kPartitionSlotSize>> partitionEntry;
 };

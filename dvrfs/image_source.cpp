@@ -1,11 +1,14 @@
 #include "dvrfs/image_source.h"
 
 #include <fcntl.h>
+#include <linux/fs.h>
+#include <sys/ioctl.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
 #include <algorithm>
 #include <cctype>
+#include <cerrno>
 #include <cstdio>
 
 #include <libewf.h>
@@ -20,6 +23,77 @@ bool EndsWith(const std::string& text, const std::string& tail)
     return std::equal(tail.rbegin(), tail.rend(), text.rbegin(),
                       [](char a, char b) { return std::tolower(a) == std::tolower(b); });
 }
+
+// pread until `size` bytes or the end of the file: the bytes read, or -1
+// when the first of them cannot be read.
+long long ReadAt(int fd, std::uint64_t offset, char* dest, std::size_t size)
+{
+    long long done = 0;
+    while (size > 0) {
+        const ssize_t got = ::pread(fd, dest, size, static_cast<off_t>(offset));
+        if (got < 0 && errno == EINTR)
+            continue;
+        if (got < 0)
+            return done > 0 ? done : -1;
+        if (got == 0)
+            break;
+        done += got;
+        dest += got;
+        offset += static_cast<std::uint64_t>(got);
+        size -= static_cast<std::size_t>(got);
+    }
+    return done;
+}
+
+// A device or a raw image file. A block device's size comes from the
+// device: its file size is 0.
+class RawSource : public ImageSource {
+public:
+    ~RawSource() override
+    {
+        if (m_fd >= 0)
+            ::close(m_fd);
+    }
+
+    bool Open(const std::string& path, SourceError* error)
+    {
+        m_path = path;
+        m_fd = ::open(path.c_str(), O_RDONLY | O_CLOEXEC);
+        struct stat info {};
+        if (m_fd < 0 || ::fstat(m_fd, &info) != 0) {
+            error->systemError = errno;
+            return false;
+        }
+        if (S_ISDIR(info.st_mode)) {
+            error->systemError = EISDIR;
+            return false;
+        }
+        m_device = S_ISBLK(info.st_mode) || S_ISCHR(info.st_mode);
+        std::uint64_t deviceSize = 0;
+        if (S_ISBLK(info.st_mode) && ::ioctl(m_fd, BLKGETSIZE64, &deviceSize) == 0)
+            m_size = deviceSize;
+        else if (S_ISREG(info.st_mode))
+            m_size = static_cast<std::uint64_t>(info.st_size);
+        return true;
+    }
+
+    long long Read(std::uint64_t offset, char* dest, std::size_t size) override
+    {
+        return ReadAt(m_fd, offset, dest, size);
+    }
+
+    std::uint64_t Size() const override { return m_size; }
+    SourceKind Type() const override { return SourceKind::kRaw; }
+    std::string Kind() const override { return m_device ? "raw device" : "raw"; }
+    std::vector<std::string> Pieces() const override { return {m_path}; }
+    bool IsDevice() const override { return m_device; }
+
+private:
+    int m_fd = -1;
+    std::string m_path;
+    std::uint64_t m_size = 0;
+    bool m_device = false;
+};
 
 // The pieces of a split raw image, one after the other: piece k holds the
 // bytes from the sum of the sizes before it.
@@ -40,7 +114,7 @@ public:
                 ::close(fd);
             return false;
         }
-        m_pieces.push_back({fd, m_size, static_cast<std::uint64_t>(info.st_size)});
+        m_pieces.push_back({fd, m_size, static_cast<std::uint64_t>(info.st_size), path});
         m_size += static_cast<std::uint64_t>(info.st_size);
         return true;
     }
@@ -55,7 +129,7 @@ public:
                 continue;
             const std::size_t wanted =
                 static_cast<std::size_t>(std::min<std::uint64_t>(size, piece.start + piece.size - offset));
-            const ssize_t got = ::pread(piece.fd, dest, wanted, static_cast<off_t>(offset - piece.start));
+            const long long got = ReadAt(piece.fd, offset - piece.start, dest, wanted);
             if (got < 0)
                 return done > 0 ? done : -1;
             done += got;
@@ -69,6 +143,15 @@ public:
     }
 
     std::uint64_t Size() const override { return m_size; }
+    SourceKind Type() const override { return SourceKind::kSplitRaw; }
+
+    std::vector<std::string> Pieces() const override
+    {
+        std::vector<std::string> paths;
+        for (const Piece& piece : m_pieces)
+            paths.push_back(piece.path);
+        return paths;
+    }
 
     std::string Kind() const override
     {
@@ -80,12 +163,13 @@ private:
         int fd;
         std::uint64_t start;
         std::uint64_t size;
+        std::string path;
     };
     std::vector<Piece> m_pieces;
     std::uint64_t m_size = 0;
 };
 
-std::unique_ptr<ImageSource> OpenSplitRaw(const std::string& first, std::string* error)
+std::unique_ptr<ImageSource> OpenSplitRaw(const std::string& first, SourceError* error)
 {
     auto source = std::make_unique<SplitRawSource>();
     const std::string base = first.substr(0, first.size() - 3);
@@ -94,7 +178,8 @@ std::unique_ptr<ImageSource> OpenSplitRaw(const std::string& first, std::string*
         std::snprintf(number, sizeof number, "%03d", k);
         if (!source->Add(base + number)) {
             if (k == 1) {
-                *error = "the first piece cannot be read";
+                error->systemError = errno;
+                error->detail = "the first piece cannot be read";
                 return nullptr;
             }
             break;
@@ -134,7 +219,7 @@ public:
             *message = EwfError(error);
             return false;
         }
-        m_segments = count;
+        m_segments.assign(names, names + count);
         const bool opened = libewf_handle_initialize(&m_handle, &error) == 1 &&
                             libewf_handle_open(m_handle, names, count, LIBEWF_OPEN_READ, &error) == 1 &&
                             libewf_handle_get_media_size(m_handle, &m_size, &error) == 1 &&
@@ -174,10 +259,12 @@ public:
     }
 
     std::uint64_t Size() const override { return m_size; }
+    SourceKind Type() const override { return SourceKind::kE01; }
+    std::vector<std::string> Pieces() const override { return m_segments; }
 
     std::string Kind() const override
     {
-        return "E01 image, " + std::to_string(m_segments) + (m_segments == 1 ? " segment" : " segments");
+        return "E01 image, " + std::to_string(m_segments.size()) + (m_segments.size() == 1 ? " segment" : " segments");
     }
 
     std::vector<std::pair<std::string, std::string>> Facts() const override
@@ -246,7 +333,7 @@ private:
     libewf_handle_t* m_handle = nullptr;
     size64_t m_size = 0;
     std::uint32_t m_chunkSize = 0;
-    int m_segments = 0;
+    std::vector<std::string> m_segments;
     std::vector<std::uint8_t> m_stored;
     std::vector<std::uint8_t> m_chunk;
     std::uint64_t m_chunkIndex = kNoChunk;
@@ -256,15 +343,35 @@ private:
 
 }  // namespace
 
-std::unique_ptr<ImageSource> OpenImageSource(const std::string& path, std::string* error)
+// Whether the path opens for reading at all, whatever it holds: an image
+// whose first file is missing is said to be missing, not to be no image.
+bool Opens(const std::string& path, SourceError* error)
 {
-    if (EndsWith(path, ".001"))
+    const int fd = ::open(path.c_str(), O_RDONLY | O_CLOEXEC);
+    if (fd < 0) {
+        error->systemError = errno;
+        return false;
+    }
+    ::close(fd);
+    return true;
+}
+
+std::unique_ptr<ImageSource> OpenImageSource(const std::string& path, SourceError* error)
+{
+    const bool split = EndsWith(path, ".001");
+    if ((split || EndsWith(path, ".e01")) && !Opens(path, error))
+        return nullptr;
+    if (split)
         return OpenSplitRaw(path, error);
     if (EndsWith(path, ".e01")) {
         auto source = std::make_unique<EwfSource>();
-        if (source->Open(path, error))
+        if (source->Open(path, &error->detail))
             return source;
+        return nullptr;
     }
+    auto source = std::make_unique<RawSource>();
+    if (source->Open(path, error))
+        return source;
     return nullptr;
 }
 

@@ -15,33 +15,24 @@
 
 using namespace dvrfs;
 
-int DvrDiskReader::BlockOpe(wxFile* file, char op, void* buffer, wxInt64 position, int count)
+int DvrDiskReader::BlockOpe(wxFile* /*file*/, char op, void* buffer, wxInt64 position, int count)
 {
     switch (op) {
-    case 2:
-        return SearchAdapter(file);
-    case 5:
-        return DumpAdapter();
-    case 33:
-        return ReadListEntries(file, static_cast<std::int32_t>(position), count, Bytes(buffer));
-    case 35:
-        return RefreshAdapter(file, position, count);
-    case 65:
-        return ReadBlockHeaders(file, position, count, Bytes(buffer));
-    default:
-        return 1;
+    case 2: return FindAdapter();
+    case 5: return DumpAdapter();
+    case 33: return ReadListEntries(static_cast<std::int32_t>(position), count, Bytes(buffer));
+    case 35: return RefreshAdapter(position, count);
+    case 65: return ReadBlockHeaders(position, count, Bytes(buffer));
+    default: return 1;
     }
 }
 
-int DvrDiskReader::DataBlockOpe(wxFile* file, char op, void* buffer, wxInt64 block, int a, int b)
+int DvrDiskReader::DataBlockOpe(wxFile* /*file*/, char op, void* buffer, wxInt64 block, int a, int b)
 {
     switch (op) {
-    case 'Q':
-        return ReadIndexEntries(file, block, a, b, Bytes(buffer));
-    case 'a':
-        return ReadPayload(file, block, a, b, Bytes(buffer));
-    default:
-        return 1;
+    case 'Q': return ReadIndexEntries(block, a, b, Bytes(buffer));
+    case 'a': return ReadPayload(block, a, b, Bytes(buffer));
+    default: return 1;
     }
 }
 
@@ -67,7 +58,7 @@ bool DvrDiskReader::AdapterRingsWithinLimits(const _HisiAdapter_t& adapter) cons
 
 // The current adapter is the end of the first run of valid slots, scanning
 // the ring twice from slot 0 so that a run across slot 119 is seen whole.
-int DvrDiskReader::SearchAdapter(wxFile* file)
+int DvrDiskReader::FindAdapter()
 {
     if (!HasVolume())
         return -1;
@@ -77,7 +68,7 @@ int DvrDiskReader::SearchAdapter(wxFile* file)
     int chosen = -1;
     for (int i = 0; i < 2 * kAdapterSlotCount; ++i) {
         const int slot = i % kAdapterSlotCount;
-        if (BlockRead(file, slot * slotStride, Bytes(candidate.get()), kAdapterSize) < 0)
+        if (ReadLogical(slot * slotStride, Bytes(candidate.get()), kAdapterSize) < 0)
             return -1;
         if (AdapterSlotIsValid(*candidate, slot))
             chosen = slot;
@@ -86,7 +77,7 @@ int DvrDiskReader::SearchAdapter(wxFile* file)
     }
 
     // With no valid slot the position is negative and the read refuses it.
-    if (BlockRead(file, chosen * slotStride, Bytes(candidate.get()), kAdapterSize) < 0)
+    if (ReadLogical(chosen * slotStride, Bytes(candidate.get()), kAdapterSize) < 0)
         return -1;
     if (!AdapterSlotIsValid(*candidate, chosen))
         return Refuse(kErrAdapter, kAtAdapter);
@@ -94,6 +85,9 @@ int DvrDiskReader::SearchAdapter(wxFile* file)
         return Refuse(kErrAdapterRings, kAtAdapterRings);
     m_volume->adapter = std::move(candidate);
     m_volume->unreadableListPositions.clear();
+    m_volume->unwrittenListPositions.clear();
+    m_volume->newestBlockUnreadable = false;
+    m_status.listRingSize = m_volume->adapter->ListMax;
 
     const _HisiAdapter_t& adapter = *m_volume->adapter;
     if (adapter.LastList.Idx < 0)
@@ -102,28 +96,32 @@ int DvrDiskReader::SearchAdapter(wxFile* file)
     wxInt64 last = adapter.LastList.Idx;
     if (last < first)
         last += adapter.ListMax;
-    return RefreshAdapter(file, first, last - first + 1) < 0 ? -1 : 1;
+    return RefreshAdapter(first, last - first + 1) < 0 ? -1 : 1;
 }
 
 // Rebuilds the adapter's summary from list entries first .. first + count - 1
 // (around the ring): oldest and newest readable entry, earliest start, latest
-// end, then the newest readable data block header and index entry.
-int DvrDiskReader::RefreshAdapter(wxFile* file, wxInt64 first, wxInt64 count)
+// end, then the newest readable data block header and index entry. A newest
+// block that cannot be read leaves the span and times as found: the other
+// recordings, and the readable frames of that one, are still there.
+int DvrDiskReader::RefreshAdapter(wxInt64 first, wxInt64 count)
 {
     if (!HasAdapter())
         return -1;
     _HisiAdapter_t& adapter = *m_volume->adapter;
-    SummariseListSpan(file, first, count);
+    SummariseListSpan(first, count);
+    m_status.damagedEntries = m_volume->unreadableListPositions.size();
+    m_status.unwrittenEntries = m_volume->unwrittenListPositions.size();
     // With no readable entry the oldest is -1, and reading it fails.
-    if (ReadListEntries(file, adapter.FirstList.Idx, 1, Bytes(&adapter.FirstList)) < 0 ||
-        ReadListEntries(file, adapter.LastList.Idx, 1, Bytes(&adapter.LastList)) < 0)
+    if (ReadListEntries(adapter.FirstList.Idx, 1, Bytes(&adapter.FirstList)) < 0 ||
+        ReadListEntries(adapter.LastList.Idx, 1, Bytes(&adapter.LastList)) < 0)
         return -1;
 
-    if (RefreshNewestBlockHeader(file) < 0)
-        return -1;
-    if (adapter.LastFrame.FrameInfo < 0)
-        return 1;  // the adapter records no frame
-    return RefreshNewestFrame(file);
+    m_volume->newestBlockUnreadable = false;
+    if (RefreshNewestBlockHeader() < 0 || (adapter.LastFrame.FrameInfo >= 0 && RefreshNewestFrame() < 0))
+        m_volume->newestBlockUnreadable = true;
+    m_status.newestBlockUnreadable = m_volume->newestBlockUnreadable;
+    return 1;
 }
 
 // Walks the span's list positions and sets the adapter's oldest and newest
@@ -134,11 +132,13 @@ int DvrDiskReader::RefreshAdapter(wxFile* file, wxInt64 first, wxInt64 count)
 // Positions repeat around the ring: a span longer than the ring is walked
 // one turn, and its newest readable position is the last readable one of the
 // span's final turn, known from that one turn without reading again.
-void DvrDiskReader::SummariseListSpan(wxFile* file, wxInt64 first, wxInt64 count)
+void DvrDiskReader::SummariseListSpan(wxInt64 first, wxInt64 count)
 {
     _HisiAdapter_t& adapter = *m_volume->adapter;
     std::vector<std::int32_t>& unreadable = m_volume->unreadableListPositions;
+    std::vector<std::int32_t>& unwritten = m_volume->unwrittenListPositions;
     unreadable.clear();
+    unwritten.clear();
     const wxInt64 ringSize = adapter.ListMax;
     wxInt64 oldest = -1;
     wxInt64 newest = -1;
@@ -153,9 +153,11 @@ void DvrDiskReader::SummariseListSpan(wxFile* file, wxInt64 first, wxInt64 count
         _HisiList_t entry{};
         for (wxInt64 k = 0; k < turn; ++k) {
             const wxInt64 position = ReduceInRing(start + k, ringSize);
-            if (ReadListEntries(file, position, 1, Bytes(&entry)) < 0) {
+            const ListEntryState state = ReadListEntry(position, &entry);
+            if (state != ListEntryState::kSound && state != ListEntryState::kRepaired) {
                 if (position <= INT32_MAX)  // only a caller's stray position is larger
-                    unreadable.push_back(static_cast<std::int32_t>(position));
+                    (state == ListEntryState::kUnwritten ? unwritten : unreadable)
+                        .push_back(static_cast<std::int32_t>(position));
                 continue;
             }
             if (oldest == -1) {
@@ -183,12 +185,15 @@ void DvrDiskReader::SummariseListSpan(wxFile* file, wxInt64 first, wxInt64 count
 
 // Reads the header of the newest recording's last block; when that is
 // damaged, walks back through the recording for the newest readable header.
-int DvrDiskReader::RefreshNewestBlockHeader(wxFile* file)
+// A header that fails its sum is never kept in the adapter.
+int DvrDiskReader::RefreshNewestBlockHeader()
 {
     _HisiAdapter_t& adapter = *m_volume->adapter;
-    char* header = Bytes(&adapter.CurBlockHeader);
-    if (ReadBlockHeaders(file, adapter.LastList.EndBlock, 1, header) >= 0)
+    _HisiBlockHeader_t header{};
+    if (ReadBlockHeaders(adapter.LastList.EndBlock, 1, Bytes(&header)) >= 0) {
+        adapter.CurBlockHeader = header;
         return 1;
+    }
 
     const wxInt64 lowest = adapter.LastList.StartBlock;
     wxInt64 candidate = adapter.LastList.EndBlock;
@@ -201,7 +206,8 @@ int DvrDiskReader::RefreshNewestBlockHeader(wxFile* file)
     const wxInt64 tries = std::min<wxInt64>(candidate - lowest + 1, std::max(adapter.DataBlockMax, 1));
     for (wxInt64 t = 0; t < tries; ++t) {
         const wxInt64 block = ReduceInRing(candidate - t, adapter.DataBlockMax);
-        if (ReadBlockHeaders(file, block, 1, header) >= 0) {
+        if (ReadBlockHeaders(block, 1, Bytes(&header)) >= 0) {
+            adapter.CurBlockHeader = header;
             adapter.LastList.EndBlock = static_cast<std::int32_t>(block);
             return 1;
         }
@@ -211,17 +217,20 @@ int DvrDiskReader::RefreshNewestBlockHeader(wxFile* file)
 
 // Reads the newest index entry of the newest block; when that is damaged,
 // the newest readable one before it, and shortens the block's frame count.
-int DvrDiskReader::RefreshNewestFrame(wxFile* file)
+int DvrDiskReader::RefreshNewestFrame()
 {
     _HisiAdapter_t& adapter = *m_volume->adapter;
-    char* frame = Bytes(&adapter.LastFrame);
+    _HisiHeader_t frame{};
     const wxInt64 block = adapter.CurBlockHeader.BlockIdx;
     const wxInt64 frameCount = adapter.CurBlockHeader.FrameCount;
-    if (ReadIndexEntries(file, block, frameCount - 1, 1, frame) >= 0)
+    if (ReadIndexEntries(block, frameCount - 1, 1, Bytes(&frame)) >= 0) {
+        adapter.LastFrame = frame;
         return 1;
+    }
     // Entries past the last one that fits are refused without a read.
     for (wxInt64 k = std::min<wxInt64>(frameCount - 2, kLastIndexEntry); k >= 0; --k) {
-        if (ReadIndexEntries(file, block, k, 1, frame) >= 0) {
+        if (ReadIndexEntries(block, k, 1, Bytes(&frame)) >= 0) {
+            adapter.LastFrame = frame;
             adapter.CurBlockHeader.FrameCount = static_cast<std::int32_t>(k + 1);
             return 1;
         }
@@ -229,34 +238,82 @@ int DvrDiskReader::RefreshNewestFrame(wxFile* file)
     return -1;
 }
 
-int DvrDiskReader::ReadListEntries(wxFile* file, wxInt64 index, int count, char* buffer)
+// Whether entries index .. index + count - 1 lie in the list ring; refused
+// with the register's code when not.
+bool DvrDiskReader::ListRunInRing(wxInt64 index, wxInt64 count)
 {
     if (!HasAdapter())
+        return false;
+    if (index < 0)
+        SetError(kErrListNegative, kAtListNegative);
+    else if (index + count > m_volume->adapter->ListMax)
+        SetError(kErrListBeyond, kAtListBeyond);
+    else
+        return true;
+    return false;
+}
+
+// The entries index .. index + count - 1 in one read of the list ring; each
+// damaged one is taken from the mirror. -1 when one is damaged in both.
+int DvrDiskReader::ReadListEntries(wxInt64 index, int count, char* buffer)
+{
+    if (!ListRunInRing(index, count))
         return -1;
     const _HisiAdapter_t& adapter = *m_volume->adapter;
-    if (index < 0)
-        return Refuse(kErrListNegative, kAtListNegative);
-    if (index + count > adapter.ListMax)
-        return Refuse(kErrListBeyond, kAtListBeyond);
     const int bytes = RecordBytes(count, kListEntrySize);
-    if (BlockRead(file, RecordPosition(adapter.ListOffset, index, kListEntrySize, 0), buffer, bytes) < 0)
+    if (ReadLogical(RecordPosition(adapter.ListOffset, index, kListEntrySize, 0), buffer, bytes) < 0)
         return -1;
+    const bool ringWhole = LastReadWhole();
     for (int j = 0; j < count; ++j) {
         char* entry = buffer + static_cast<wxInt64>(j) * kListEntrySize;
         if (RecordSumMatches(entry, kListEntrySize))
             continue;
-        // Damaged in the ring: take the mirror copy; code 50 stays either way.
-        SetError(kErrListEntry, kAtListEntry);
-        if (BlockRead(file, RecordPosition(adapter.ListOffsetBackup, index + j, kListEntrySize, 0), entry,
-                      kListEntrySize) < 0)
-            return -1;
-        if (!RecordSumMatches(entry, kListEntrySize))
+        if (RepairFromMirror(index + j, entry, ringWhole) != ListEntryState::kRepaired)
             return -1;
     }
     return 1;
 }
 
-int DvrDiskReader::ReadBlockHeaders(wxFile* file, wxInt64 block, int count, char* buffer)
+ListEntryState DvrDiskReader::ReadListEntry(wxInt64 position, _HisiList_t* entry)
+{
+    if (!ListRunInRing(position, 1))
+        return ListEntryState::kRefused;
+    const _HisiAdapter_t& adapter = *m_volume->adapter;
+    char* bytes = Bytes(entry);
+    if (ReadLogical(RecordPosition(adapter.ListOffset, position, kListEntrySize, 0), bytes, kListEntrySize) < 0)
+        return ListEntryState::kRefused;
+    if (RecordSumMatches(bytes, kListEntrySize))
+        return ListEntryState::kSound;
+    return RepairFromMirror(position, bytes, LastReadWhole());
+}
+
+namespace {
+
+bool AllZero(const char* bytes, int size)
+{
+    return std::all_of(bytes, bytes + size, [](char b) { return b == 0; });
+}
+
+}  // namespace
+
+// The ring copy of `entry` failed its sum: code 50 is recorded and stays,
+// and the mirror copy is read over it. Both copies of nothing but zero bytes,
+// each read whole from the disk, are an entry never written.
+ListEntryState DvrDiskReader::RepairFromMirror(wxInt64 position, char* entry, bool ringWhole)
+{
+    SetError(kErrListEntry, kAtListEntry);
+    const bool ringBlank = ringWhole && AllZero(entry, kListEntrySize);
+    const _HisiAdapter_t& adapter = *m_volume->adapter;
+    if (ReadLogical(RecordPosition(adapter.ListOffsetBackup, position, kListEntrySize, 0), entry, kListEntrySize) < 0)
+        return ListEntryState::kDamaged;
+    if (RecordSumMatches(entry, kListEntrySize))
+        return ListEntryState::kRepaired;
+    if (ringBlank && LastReadWhole() && AllZero(entry, kListEntrySize))
+        return ListEntryState::kUnwritten;
+    return ListEntryState::kDamaged;
+}
+
+int DvrDiskReader::ReadBlockHeaders(wxInt64 block, int count, char* buffer)
 {
     if (!HasAdapter())
         return -1;
@@ -268,7 +325,7 @@ int DvrDiskReader::ReadBlockHeaders(wxFile* file, wxInt64 block, int count, char
         return Refuse(kErrBlockBeyond, kAtBlockBeyond);
     for (int j = 0; j < count; ++j) {
         char* header = buffer + static_cast<wxInt64>(j) * kBlockHeaderSize;
-        if (BlockRead(file, RecordPosition(adapter.DataBlockOffset, block + j, kDataBlockSize, 0), header,
+        if (ReadLogical(RecordPosition(adapter.DataBlockOffset, block + j, kDataBlockSize, 0), header,
                       kBlockHeaderSize) < 0)
             return -1;
         if (!RecordSumMatches(header, kBlockHeaderSize))
@@ -279,8 +336,7 @@ int DvrDiskReader::ReadBlockHeaders(wxFile* file, wxInt64 block, int count, char
 
 // Index entries grow down from the end of the block: entries first ..
 // first + count - 1 are one range in which the last of them comes first.
-int DvrDiskReader::ReadIndexEntries(wxFile* file, wxInt64 block, wxInt64 first, wxInt64 count,
-                                    char* buffer)
+int DvrDiskReader::ReadIndexEntries(wxInt64 block, wxInt64 first, wxInt64 count, char* buffer)
 {
     if (!HasAdapter())
         return -1;
@@ -295,7 +351,7 @@ int DvrDiskReader::ReadIndexEntries(wxFile* file, wxInt64 block, wxInt64 first, 
             ? -1
             : RecordPosition(adapter.DataBlockOffset, nextBlock, kDataBlockSize, -(first + count) * kIndexEntrySize);
     const int bytes = RecordBytes(count, kIndexEntrySize);
-    if (BlockRead(file, position, buffer, bytes) < 0)
+    if (ReadLogical(position, buffer, bytes) < 0)
         return -1;
     for (wxInt64 j = 0; j < count; ++j) {
         if (!RecordSumMatches(buffer + j * kIndexEntrySize, kIndexEntrySize))
@@ -304,7 +360,7 @@ int DvrDiskReader::ReadIndexEntries(wxFile* file, wxInt64 block, wxInt64 first, 
     return 1;
 }
 
-int DvrDiskReader::ReadPayload(wxFile* file, wxInt64 block, int offset, int length, char* buffer)
+int DvrDiskReader::ReadPayload(wxInt64 block, int offset, int length, char* buffer)
 {
     if (!HasAdapter())
         return -1;
@@ -314,7 +370,7 @@ int DvrDiskReader::ReadPayload(wxFile* file, wxInt64 block, int offset, int leng
     // Taken as unsigned 32 bits, so that a negative length is refused too.
     if (static_cast<std::uint32_t>(static_cast<wxInt64>(offset) + length) > kPayloadAreaSize)
         return Refuse(kErrPayloadBeyond, kAtPayloadBeyond);
-    return BlockRead(file, RecordPosition(adapter.DataBlockOffset, block, kDataBlockSize, kBlockHeaderSize + offset),
+    return ReadLogical(RecordPosition(adapter.DataBlockOffset, block, kDataBlockSize, kBlockHeaderSize + offset),
                      buffer, length);
 }
 

@@ -21,20 +21,37 @@ wxInt64 MaxEmptyBlocks(wxInt64 ringSize)
 
 }  // namespace
 
-int DvrDiskReader::DeliverFrame(wxFile* file, const _HisiBlockHeader_t& block, unsigned char* payload,
-                                _HisiHeader_t* header)
+int DvrDiskReader::DeliverFrame(const _HisiBlockHeader_t& block, unsigned char* payload, _HisiHeader_t* header)
 {
-    if (ReadIndexEntries(file, block.BlockIdx, m_streamFrame, 1, Bytes(header)) < 0)
+    if (ReadIndexEntries(block.BlockIdx, m_streamFrame, 1, Bytes(header)) < 0)
         return -1;
-    if (ReadPayload(file, block.BlockIdx, header->DataOffset, header->DataSize, Bytes(payload)) < 0)
+    if (ReadPayload(block.BlockIdx, header->DataOffset, header->DataSize, Bytes(payload)) < 0)
         return -1;
     if (header->DataSize < 0)
         return -1;
     return header->DataSize;
 }
 
-int DvrDiskReader::get_stream(wxFile* file, unsigned char* payload, _HisiHeader_t* header, _HisiList_t first,
+void DvrDiskReader::SetStreamCursor(wxInt64 block, std::int32_t frame)
+{
+    m_streamBlock = block;
+    m_streamFrame = frame;
+}
+
+int DvrDiskReader::get_stream(wxFile* /*file*/, unsigned char* payload, _HisiHeader_t* header, _HisiList_t first,
                               _HisiList_t last, int direction)
+{
+    return NextFrame(payload, header, first, last, direction);
+}
+
+int DvrDiskReader::StreamRead(wxFile* /*file*/, char flags, wxInt64 block, int first, int count,
+                              _HisiHeader_t* entries, unsigned char* payload)
+{
+    return ReadFrameRun(flags, block, first, count, entries, payload);
+}
+
+int DvrDiskReader::NextFrame(unsigned char* payload, _HisiHeader_t* header, const _HisiList_t& first,
+                             const _HisiList_t& last, int direction)
 {
     if (!HasAdapter())
         return -1;
@@ -49,10 +66,10 @@ int DvrDiskReader::get_stream(wxFile* file, unsigned char* payload, _HisiHeader_
         if (first.StartBlock > last.EndBlock)
             limit += ringSize;
         for (wxInt64 passed = 0;; ++passed) {
-            if (ReadBlockHeaders(file, ReduceInRing(m_streamBlock, ringSize), 1, Bytes(&block)) < 0)
+            if (ReadBlockHeaders(ReduceInRing(m_streamBlock, ringSize), 1, Bytes(&block)) < 0)
                 return -1;
             if (m_streamFrame < block.FrameCount) {
-                const int size = DeliverFrame(file, block, payload, header);
+                const int size = DeliverFrame(block, payload, header);
                 if (size < 0)
                     return -1;
                 ++m_streamFrame;
@@ -64,7 +81,7 @@ int DvrDiskReader::get_stream(wxFile* file, unsigned char* payload, _HisiHeader_
                 ++m_streamBlock;
             if (m_streamBlock > limit) {
                 _HisiList_t oldest{};
-                if (ReadListEntries(file, ReduceInRing(adapter.FirstList.Idx, adapter.ListMax), 1, Bytes(&oldest)) < 0)
+                if (ReadListEntries(ReduceInRing(adapter.FirstList.Idx, adapter.ListMax), 1, Bytes(&oldest)) < 0)
                     return -1;
                 m_streamBlock = oldest.StartBlock;
             }
@@ -75,14 +92,14 @@ int DvrDiskReader::get_stream(wxFile* file, unsigned char* payload, _HisiHeader_
     // Backward: past the start of the oldest recording, play goes on from the
     // end of the newest one.
     _HisiList_t oldest{};
-    if (ReadListEntries(m_diskFile, ReduceInRing(adapter.FirstList.Idx, adapter.ListMax), 1, Bytes(&oldest)) < 0)
+    if (ReadListEntries(ReduceInRing(adapter.FirstList.Idx, adapter.ListMax), 1, Bytes(&oldest)) < 0)
         return -1;
     const wxInt64 limit = oldest.StartBlock;
     for (wxInt64 passed = 0;; ++passed) {
-        if (ReadBlockHeaders(file, ReduceInRing(m_streamBlock, ringSize), 1, Bytes(&block)) < 0)
+        if (ReadBlockHeaders(ReduceInRing(m_streamBlock, ringSize), 1, Bytes(&block)) < 0)
             return -1;
         if (m_streamFrame >= 0) {
-            const int size = DeliverFrame(file, block, payload, header);
+            const int size = DeliverFrame(block, payload, header);
             if (size < 0)
                 return -1;
             --m_streamFrame;
@@ -93,22 +110,22 @@ int DvrDiskReader::get_stream(wxFile* file, unsigned char* payload, _HisiHeader_
         --m_streamBlock;  // not negative here: the header read above refuses negative blocks
         if (m_streamBlock < limit) {
             _HisiList_t newest{};
-            if (ReadListEntries(file, ReduceInRing(adapter.LastList.Idx, adapter.ListMax), 1, Bytes(&newest)) < 0)
+            if (ReadListEntries(ReduceInRing(adapter.LastList.Idx, adapter.ListMax), 1, Bytes(&newest)) < 0)
                 return -1;
             m_streamBlock = newest.EndBlock;
         }
-        if (ReadBlockHeaders(file, ReduceInRing(m_streamBlock, ringSize), 1, Bytes(&block)) < 0)
+        if (ReadBlockHeaders(ReduceInRing(m_streamBlock, ringSize), 1, Bytes(&block)) < 0)
             return -1;
         m_streamFrame = block.FrameCount > INT32_MIN ? block.FrameCount - 1 : -1;
     }
 }
 
-int DvrDiskReader::StreamRead(wxFile* file, char flags, wxInt64 block, int first, int count,
-                              _HisiHeader_t* entries, unsigned char* payload)
+int DvrDiskReader::ReadFrameRun(char flags, wxInt64 block, int first, int count, _HisiHeader_t* entries,
+                               unsigned char* payload)
 {
     if (count < 1 || !entries)
         return -1;
-    if ((flags & 1) && ReadIndexEntries(file, block, first, count, Bytes(entries)) < 0)
+    if ((flags & 1) && ReadIndexEntries(block, first, count, Bytes(entries)) < 0)
         return -1;
     // From the start of the oldest frame of the run (last in the array) to
     // the end of the newest (first in the array).
@@ -118,7 +135,7 @@ int DvrDiskReader::StreamRead(wxFile* file, char flags, wxInt64 block, int first
     if (length > INT_MAX || length < INT_MIN)
         return Refuse(kErrPayloadBeyond, kAtPayloadBeyond);
     if ((flags & 2) &&
-        ReadPayload(file, block, oldest.DataOffset, static_cast<int>(length), Bytes(payload)) < 0)
+        ReadPayload(block, oldest.DataOffset, static_cast<int>(length), Bytes(payload)) < 0)
         return -1;
     return static_cast<int>(length);
 }

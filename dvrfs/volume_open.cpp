@@ -3,8 +3,8 @@
 #include <cstdarg>
 #include <cstdio>
 #include <cstring>
-
-#include <wx/log.h>
+#include <string>
+#include <vector>
 
 #include "dvrfs/dvr_disk_reader.h"
 #include "dvrfs/error_places.h"
@@ -16,22 +16,27 @@ DvrDiskReader::DvrDiskReader()
       m_volume(nullptr),
       m_errorText{},
       m_errorCode(kErrNone),
+      m_errorPlace(0),
       m_streamBlock(0),
-      m_streamFrame(0),
-      m_diskFile(nullptr)
+      m_streamFrame(0)
 {
 }
 
 DvrDiskReader::~DvrDiskReader()
 {
-    CloseDVRFS();
+    CloseVolume();
+    ReleaseCatalog();
+}
+
+void DvrDiskReader::ReleaseCatalog()
+{
     delete m_catalog;
     m_catalog = nullptr;
 }
 
 void DvrDiskReader::SetError(std::int32_t code, int number)
 {
-    SetErrorText(code, "%s[%d]", kFunctionWord, number);
+    SetErrorText(code, number, "%s[%d]", kFunctionWord, number);
 }
 
 int DvrDiskReader::Refuse(std::int32_t code, int number)
@@ -40,19 +45,36 @@ int DvrDiskReader::Refuse(std::int32_t code, int number)
     return -1;
 }
 
-void DvrDiskReader::SetErrorText(std::int32_t code, const char* format, ...)
+void DvrDiskReader::SetErrorText(std::int32_t code, int number, const char* format, ...)
 {
     m_errorCode = code;
+    m_errorPlace = number;
     va_list args;
     va_start(args, format);
     std::vsnprintf(m_errorText, sizeof m_errorText, format, args);
     va_end(args);
 }
 
-int DvrDiskReader::OpenDVRFS(wxString path)
+void DvrDiskReader::ClearError()
 {
-    if (!m_diskFile)
-        m_diskFile = new wxFile;
+    m_errorCode = kErrNone;
+    m_errorPlace = 0;
+    m_errorText[0] = '\0';
+}
+
+void DvrDiskReader::RecordFailure(OpenStage stage)
+{
+    m_status.stage = stage;
+    m_status.code = m_errorCode;
+    m_status.place = m_errorPlace;
+    m_status.registerText = m_errorText;
+}
+
+// The volume and the catalogue, allocated by the first open and reused by
+// every later one; an adapter found on the disk held so far says nothing of
+// the next one.
+void DvrDiskReader::PrepareVolume()
+{
     if (!m_volume)
         m_volume = new DvrVolume;
     if (!m_catalog) {
@@ -62,46 +84,97 @@ int DvrDiskReader::OpenDVRFS(wxString path)
         m_catalog->Opened2 = 0;
         m_catalog->SpanCount = 0;
     }
-
-    // An adapter found on the device held so far says nothing of the next one.
     m_volume->adapter.reset();
-    {
-        // A disk that cannot be opened is an answer, not something to show.
-        wxLogNull quiet;
-        if (m_diskFile->IsOpened())
-            m_diskFile->Close();
-        if (!m_diskFile->Open(path, wxFile::read, wxS_DEFAULT))
-            return 0;
+    m_volume->unreadableListPositions.clear();
+    m_volume->unwrittenListPositions.clear();
+}
+
+VolumeStatus DvrDiskReader::OpenVolume(const std::string& path)
+{
+    if (OpenDisk(path) <= 0)
+        return m_status;
+    if (ConfiguredVersion() <= 0) {
+        RecordFailure(OpenStage::kConfiguration);
+        return m_status;
     }
-    std::string sourceError;
-    m_imageSource = OpenImageSource(path.utf8_string(), &sourceError);
-    if (!m_imageSource && !sourceError.empty()) {
-        m_diskFile->Close();  // an image of a known kind that does not open is no disk
+    if (FindAdapter() < 0) {
+        RecordFailure(Adapter() ? OpenStage::kRefresh : OpenStage::kAdapter);
+        return m_status;
+    }
+    m_status.stage = OpenStage::kReady;
+    return m_status;
+}
+
+int DvrDiskReader::OpenDisk(const std::string& path)
+{
+    PrepareVolume();
+    m_status = VolumeStatus{};
+    if (OpenSource(path) <= 0) {
+        RecordFailure(OpenStage::kSource);
         return 0;
     }
     m_catalog->Opened = 1;
     m_catalog->Opened2 = 1;
 
-    Getpartition(m_diskFile);
-    if (LoadSuperBlock(m_diskFile) < 0) {
-        CloseDVRFS();
+    Getpartition(nullptr);
+    if (LoadSuperBlock() < 0) {
+        RecordFailure(OpenStage::kSuperBlock);
+        CloseVolume();
         return 0;
     }
+    m_status.copyInUse = m_volume->copyInUse;
+    NoteClaimedSize();
+    m_status.stage = OpenStage::kConfiguration;
     return 1;
+}
+
+int DvrDiskReader::OpenSource(const std::string& path)
+{
+    m_source.reset();
+    SourceError error;
+    m_source = OpenImageSource(path, &error);
+    if (!m_source) {
+        m_status.systemError = error.systemError;
+        m_status.detail = error.detail;
+        return 0;
+    }
+    m_status.sourceOpened = true;
+    m_status.sourceKind = m_source->Kind();
+    m_status.pieces = m_source->Pieces();
+    m_status.sourceSize = m_source->Size();
+    m_status.device = m_source->IsDevice();
+    return 1;
+}
+
+// The size of the disk the superblock describes: its block space and the
+// one physical block left out after every 512 logical ones. Known only for a
+// positive block count; it saturates rather than overflow.
+void DvrDiskReader::NoteClaimedSize()
+{
+    const _H264SuperBlock_t& super = m_volume->superBlock;
+    if (super.BlockCount <= 0 || super.BlockSize <= 0)
+        return;
+    const std::uint64_t blocks = static_cast<std::uint64_t>(super.BlockCount) + (super.BlockCount - 1) / 512;
+    std::uint64_t bytes = 0;
+    if (__builtin_mul_overflow(blocks, static_cast<std::uint64_t>(super.BlockSize), &bytes) ||
+        __builtin_add_overflow(bytes, static_cast<std::uint64_t>(super.OffsetBlockSpace), &bytes))
+        bytes = UINT64_MAX;
+    m_status.claimedSize = bytes;
 }
 
 // The primary copy when it is sound, else the backup copy when that is: the
 // backup exists so that one damaged sector does not lose the disk. The
 // register then says which part of the primary copy was damaged.
-int DvrDiskReader::LoadSuperBlock(wxFile* file)
+int DvrDiskReader::LoadSuperBlock()
 {
     m_volume->copyInUse = SuperBlockCopy::kPrimary;
-    if (SuperBlockOpe(file, 3, nullptr) >= 0 && CheckSuperBlockValues() >= 0)
+    m_status.primary = LoadCopy(false);
+    if (m_status.primary == CopyState::kSound)
         return 1;
-    const bool onlyTableDamaged = m_errorCode == kErrBlockTable || m_errorCode == kErrTableSize;
-    if (SuperBlockOpe(file, 5, nullptr) < 0 || CheckSuperBlockValues() < 0)
+    m_status.backup = LoadCopy(true);
+    if (m_status.backup != CopyState::kSound)
         return -1;
-    if (onlyTableDamaged) {
+    if (m_status.primary == CopyState::kTableDamaged) {
         m_volume->copyInUse = SuperBlockCopy::kBackupTable;
         SetError(kErrBackupBlockTable, kAtBackupBlockTable);
     } else {
@@ -109,6 +182,49 @@ int DvrDiskReader::LoadSuperBlock(wxFile* file)
         SetError(kErrBackupSuperBlock, kAtBackupSuperBlock);
     }
     return 1;
+}
+
+CopyState DvrDiskReader::LoadCopy(bool backup)
+{
+    const int loaded = backup ? LoadBackupSuperBlock() : LoadPrimarySuperBlock();
+    if (loaded >= 0 && CheckSuperBlockValues() >= 0)
+        return CopyState::kSound;
+    return StateOfFailedCopy();
+}
+
+// What the copy that just failed to load is, from the register's code and
+// the header read.
+CopyState DvrDiskReader::StateOfFailedCopy() const
+{
+    switch (m_errorCode) {
+    case kErrBlockTable:
+    case kErrTableSize: return CopyState::kTableDamaged;
+    case kErrTableLimit:
+    case kErrGeometry: return CopyState::kImpossibleLayout;
+    default: break;
+    }
+    const _H264SuperBlock_t& super = m_volume->superBlock;
+    if (super.HeaderSize != kSuperHeaderSize || super.Magic != kSuperMagic)
+        return CopyState::kNoSuperBlock;
+    return CopyState::kSuperBlockDamaged;
+}
+
+void DvrDiskReader::InspectSuperBlockCopies()
+{
+    if (!m_volume || !m_source)
+        return;
+    const _H264SuperBlock_t inUse = m_volume->superBlock;
+    std::vector<_H264BlockTable_t> table = m_volume->blockTable;
+    const std::int32_t code = m_errorCode;
+    const int place = m_errorPlace;
+    const std::string text = m_errorText;
+    if (m_status.primary == CopyState::kUnread)
+        m_status.primary = LoadCopy(false);
+    if (m_status.backup == CopyState::kUnread)
+        m_status.backup = LoadCopy(true);
+    m_volume->superBlock = inUse;
+    m_volume->blockTable = std::move(table);
+    SetErrorText(code, place, "%s", text.c_str());
 }
 
 // What the reader needs of a verified superblock's values before it uses them.
@@ -122,57 +238,38 @@ int DvrDiskReader::CheckSuperBlockValues()
     return 1;
 }
 
-void DvrDiskReader::CloseDVRFS()
+void DvrDiskReader::CloseVolume()
 {
     delete m_volume;
     m_volume = nullptr;
-    m_imageSource.reset();
-    if (m_diskFile) {
-        m_diskFile->Close();
-        delete m_diskFile;
-        m_diskFile = nullptr;
-    }
+    m_source.reset();
 }
 
-int DvrDiskReader::SuperBlockOpe(wxFile* file, char mode, void* /*arg*/)
+int DvrDiskReader::LoadPrimarySuperBlock()
 {
-    if (mode != 3 && mode != 5 && mode != 6 && mode != 7)
-        return 1;
     if (!HasVolume())
         return -1;
-    switch (mode) {
-    case 3:
-        return LoadPrimarySuperBlock(file);
-    case 5:
-        return LoadBackupSuperBlock(file);
-    case 6:
-        return VerifySuperBlock();
-    default:
-        return VerifyBlockTable();
-    }
-}
-
-int DvrDiskReader::LoadPrimarySuperBlock(wxFile* file)
-{
     _H264SuperBlock_t& super = m_volume->superBlock;
     super = _H264SuperBlock_t{};
-    HddataRead(file, reinterpret_cast<char*>(&super), 0, kSuperBlockSize);
+    ReadSectors(reinterpret_cast<char*>(&super), 0, kSuperBlockSize);
     if (VerifySuperBlock() < 0)
         return -1;
-    if (ReloadBlockTable(file, super.SuperOffset) < 0)
+    if (ReloadBlockTable(super.SuperOffset) < 0)
         return -1;
     return VerifyBlockTable();
 }
 
-int DvrDiskReader::LoadBackupSuperBlock(wxFile* file)
+int DvrDiskReader::LoadBackupSuperBlock()
 {
+    if (!HasVolume())
+        return -1;
     _H264SuperBlock_t& super = m_volume->superBlock;
     const wxUint64 backupOffset = super.SuperOffsetBackup;
     super = _H264SuperBlock_t{};
-    HddataRead(file, reinterpret_cast<char*>(&super), backupOffset, kSuperBlockSize);
+    ReadSectors(reinterpret_cast<char*>(&super), backupOffset, kSuperBlockSize);
     if (VerifySuperBlock() < 0)
         return -1;
-    if (ReloadBlockTable(file, super.SuperOffsetBackup) < 0)
+    if (ReloadBlockTable(super.SuperOffsetBackup) < 0)
         return -1;
     if (VerifyBlockTable() < 0)
         return -1;
@@ -181,7 +278,7 @@ int DvrDiskReader::LoadBackupSuperBlock(wxFile* file)
 
 // Replaces the block table with a zero-filled one of BlockTableCount + 1
 // entries and reads the table that lies 8192 bytes after superOffset.
-int DvrDiskReader::ReloadBlockTable(wxFile* file, wxUint64 superOffset)
+int DvrDiskReader::ReloadBlockTable(wxUint64 superOffset)
 {
     const std::uint32_t count = m_volume->superBlock.BlockTableCount;
     m_volume->blockTable.clear();
@@ -190,7 +287,7 @@ int DvrDiskReader::ReloadBlockTable(wxFile* file, wxUint64 superOffset)
         return Refuse(kErrTableSize, kAtTableSize);
     m_volume->blockTable.assign(static_cast<std::size_t>(count) + 1, _H264BlockTable_t{});
     if (count != 0)
-        HddataRead(file, reinterpret_cast<char*>(m_volume->blockTable.data()),
+        ReadSectors(reinterpret_cast<char*>(m_volume->blockTable.data()),
                    superOffset + kBlockTableGap,
                    static_cast<unsigned long>(count) * kBlockTableEntrySize);
     return 1;
@@ -198,9 +295,11 @@ int DvrDiskReader::ReloadBlockTable(wxFile* file, wxUint64 superOffset)
 
 int DvrDiskReader::VerifySuperBlock()
 {
+    if (!HasVolume())
+        return -1;
     _H264SuperBlock_t& super = m_volume->superBlock;
     if (super.HeaderSize != kSuperHeaderSize) {
-        SetErrorText(kErrSuperBlock, "%s[%d]%d != %d", kFunctionWord, kAtHeaderSize,
+        SetErrorText(kErrSuperBlock, kAtHeaderSize, "%s[%d]%d != %d", kFunctionWord, kAtHeaderSize,
                      static_cast<int>(super.HeaderSize), static_cast<int>(kSuperHeaderSize));
         return -1;
     }
@@ -215,6 +314,8 @@ int DvrDiskReader::VerifySuperBlock()
 
 int DvrDiskReader::VerifyBlockTable()
 {
+    if (!HasVolume())
+        return -1;
     const _H264SuperBlock_t& super = m_volume->superBlock;
     const std::uint64_t bytes = static_cast<std::uint64_t>(super.BlockTableCount) * kBlockTableEntrySize;
     // A table that was never loaded (or refused as too large) holds nothing.
@@ -261,12 +362,45 @@ bool DvrDiskReader::HasAdapter()
     return false;
 }
 
-void DvrDiskReader::Getpartition(wxFile* file)
+int DvrDiskReader::ConfiguredVersion()
+{
+    char slot[kAdapterSize] = {};
+    if (ReadLogical(0, slot, kAdapterSize) < 0)
+        return -1;
+    std::int32_t version = 0;
+    std::memcpy(&version, slot + offsetof(_HisiAdapter_t, Version), sizeof version);
+    return version;
+}
+
+// --- The operation-code entry points.
+
+int DvrDiskReader::OpenDVRFS(wxString path)
+{
+    return OpenDisk(std::string(path.fn_str()));
+}
+
+void DvrDiskReader::CloseDVRFS()
+{
+    CloseVolume();
+}
+
+int DvrDiskReader::SuperBlockOpe(wxFile* /*file*/, char mode, void* /*arg*/)
+{
+    switch (mode) {
+    case 3: return LoadPrimarySuperBlock();
+    case 5: return LoadBackupSuperBlock();
+    case 6: return VerifySuperBlock();
+    case 7: return VerifyBlockTable();
+    default: return 1;
+    }
+}
+
+void DvrDiskReader::Getpartition(wxFile* /*file*/)
 {
     if (!m_volume)
         return;
     char sector[kSectorSize] = {};
-    HddataRead(file, sector, 0, kSectorSize);
+    ReadSectors(sector, 0, kSectorSize);
     auto entry = std::make_unique<std::array<char, kPartitionSlotSize>>();
     std::memcpy(entry->data(), sector + kPartitionSlotOffset, kPartitionSlotSize);
     m_volume->partitionEntry = std::move(entry);
@@ -274,12 +408,7 @@ void DvrDiskReader::Getpartition(wxFile* file)
 
 int DvrDiskReader::Checkconfig()
 {
-    char slot[kAdapterSize] = {};
-    if (BlockRead(m_diskFile, 0, slot, kAdapterSize) < 0)
-        return -1;
-    std::int32_t version = 0;
-    std::memcpy(&version, slot + offsetof(_HisiAdapter_t, Version), sizeof version);
-    return version;
+    return ConfiguredVersion();
 }
 
 wxInt64 DvrDiskReader::GetInfo(char selector)

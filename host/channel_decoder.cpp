@@ -54,7 +54,7 @@ public:
         _HisiList_t recording{};
         if (!OpenRecording(m_reader, session.path, session.record, &recording))
             return false;
-        const _HisiAdapter_t& adapter = *m_reader.m_volume->adapter;
+        const _HisiAdapter_t& adapter = *m_reader.Adapter();
         if (adapter.DataBlockMax <= 0)
             return false;
         m_oldest = adapter.FirstList;
@@ -64,13 +64,12 @@ public:
         // has wrapped, the newer recordings lie below the oldest one's start
         // and are counted on from the end of the ring.
         const bool wrapped = m_oldest.StartBlock > m_newest.EndBlock;
-        m_newestBlock = m_newest.EndBlock + (wrapped ? adapter.DataBlockMax : 0);
+        m_newestBlock = static_cast<long long>(m_newest.EndBlock) + (wrapped ? adapter.DataBlockMax : 0);
         long long start = recording.StartBlock;
         if (wrapped && start < m_oldest.StartBlock)
             start += adapter.DataBlockMax;
         m_timeline = std::make_unique<RecordingTimeline>(m_reader);
-        m_reader.m_streamBlock = start;
-        m_reader.m_streamFrame = 0;
+        m_reader.SetStreamCursor(start, 0);
         m_payload.resize(static_cast<std::size_t>(kPayloadAreaSize));
         return m_decoder.Ok();
     }
@@ -97,38 +96,37 @@ private:
         if (m_lastDirection < 0) {
             // Back to forward: on from the key frame shown last, which the
             // decoder still holds.
-            m_reader.m_streamBlock = m_lastBlock;
-            m_reader.m_streamFrame = m_lastEntry + 1;
+            m_reader.SetStreamCursor(m_lastBlock, m_lastEntry + 1);
         }
         m_lastDirection = 1;
         if (PastTheNewestFrame())
             return End(1);
-        const long long before = m_reader.m_streamBlock;
+        const long long before = m_reader.StreamBlock();
         _HisiHeader_t frame{};
-        const int size = m_reader.get_stream(m_reader.m_diskFile, m_payload.data(), &frame, m_oldest, m_newest, 1);
+        const int size = m_reader.NextFrame(m_payload.data(), &frame, m_oldest, m_newest, 1);
         if (size < 0) {
             SkipDamaged(1);
             return 0;
         }
-        if (m_reader.m_streamBlock < before)
+        if (m_reader.StreamBlock() < before)
             return End(1);  // the walk went round to the oldest recording
         m_damagedInARow = 0;
-        m_lastBlock = m_reader.m_streamBlock;
-        m_lastEntry = m_reader.m_streamFrame - 1;
+        m_lastBlock = m_reader.StreamBlock();
+        m_lastEntry = m_reader.StreamFrame() - 1;
         Show(lock, size, PastTheNewestFrame());  // the newest frame must not stay in the parser
         return FrameInterval(speed, 1);
     }
 
     bool PastTheNewestFrame() const
     {
-        const long long block = m_reader.m_streamBlock;
-        return block > m_newestBlock || (block == m_newestBlock && m_reader.m_streamFrame >= m_newestFrames);
+        const long long block = m_reader.StreamBlock();
+        return block > m_newestBlock || (block == m_newestBlock && m_reader.StreamFrame() >= m_newestFrames);
     }
 
     bool BeforeTheOldestFrame() const
     {
-        const long long block = m_reader.m_streamBlock;
-        return block < m_oldest.StartBlock || (block == m_oldest.StartBlock && m_reader.m_streamFrame < 0);
+        const long long block = m_reader.StreamBlock();
+        return block < m_oldest.StartBlock || (block == m_oldest.StartBlock && m_reader.StreamFrame() < 0);
     }
 
     // Playback stops at either end of the disk's recordings, the last picture
@@ -178,26 +176,24 @@ private:
     int StepBackward(std::unique_lock<std::mutex>& lock, int speed)
     {
         if (m_lastDirection >= 0) {
-            m_reader.m_streamBlock = m_lastBlock;
-            m_reader.m_streamFrame = m_lastEntry - 1;
+            m_reader.SetStreamCursor(m_lastBlock, m_lastEntry - 1);
         }
         m_lastDirection = -1;
         for (int passed = 1; passed <= kMaxFramesToAKeyFrame; ++passed) {
             if (BeforeTheOldestFrame())
                 return End(-1);
-            const long long before = m_reader.m_streamBlock;
+            const long long before = m_reader.StreamBlock();
             _HisiHeader_t frame{};
-            const int size =
-                m_reader.get_stream(m_reader.m_diskFile, m_payload.data(), &frame, m_oldest, m_newest, 0);
+            const int size = m_reader.NextFrame(m_payload.data(), &frame, m_oldest, m_newest, 0);
             if (size < 0) {
                 SkipDamaged(-1);
                 return 0;
             }
-            if (m_reader.m_streamBlock > before || m_reader.m_streamBlock < m_oldest.StartBlock)
+            if (m_reader.StreamBlock() > before || m_reader.StreamBlock() < m_oldest.StartBlock)
                 return End(-1);  // the walk went round to the newest recording
             m_damagedInARow = 0;
-            m_lastBlock = m_reader.m_streamBlock;
-            m_lastEntry = m_reader.m_streamFrame + 1;
+            m_lastBlock = m_reader.StreamBlock();
+            m_lastEntry = m_reader.StreamFrame() + 1;
             if (!H264Decoder::IsKeyFrame(m_payload.data(), static_cast<std::size_t>(size)))
                 continue;
             m_decoder.Reset();
@@ -211,17 +207,14 @@ private:
     // retried; a disk where nothing reads any more is left alone.
     void SkipDamaged(int direction)
     {
-        if (++m_damagedInARow > m_reader.m_volume->adapter->DataBlockMax + 2) {
+        if (++m_damagedInARow > static_cast<long long>(m_reader.Adapter()->DataBlockMax) + 2) {
             PlaybackControl::Get()->SetSpeed(m_dvrId, 0);
             return;
         }
-        if (direction > 0) {
-            ++m_reader.m_streamBlock;
-            m_reader.m_streamFrame = 0;
-        } else {
-            --m_reader.m_streamBlock;
-            m_reader.m_streamFrame = -1;
-        }
+        if (direction > 0)
+            m_reader.SetStreamCursor(m_reader.StreamBlock() + 1, 0);
+        else
+            m_reader.SetStreamCursor(m_reader.StreamBlock() - 1, -1);
         m_decoder.Reset();
     }
 

@@ -64,11 +64,10 @@ void PlaybackControl::Forget(long long dvrId)
 
 bool OpenRecording(CatalogReader& reader, const wxString& disk, int record, _HisiList_t* recording)
 {
-    if (reader.OpenDVRFS(disk) <= 0 || reader.Checkconfig() <= 0)
+    if (!reader.OpenVolume(std::string(disk.fn_str())).Ready())
         return false;
-    if (reader.BlockOpe(reader.m_diskFile, 2, nullptr, 0, 0) < 0 && !reader.m_volume->adapter)
-        return false;
-    const int ringSize = reader.m_volume->adapter->ListMax;
-    return ringSize > 0 && record >= 0 && reader.BlockOpe(reader.m_diskFile, 33, recording, record % ringSize, 1) > 0 &&
+    const int ringSize = reader.Adapter()->ListMax;
+    return ringSize > 0 && record >= 0 &&
+           reader.ReadListEntries(record % ringSize, 1, reinterpret_cast<char*>(recording)) > 0 &&
            (recording->Idx & 0xFFFF) == record;
 }

@@ -45,10 +45,10 @@ private:
 class CatalogReader;
 struct _HisiList_t;
 
-// Opens the disk with `reader`, finds its current adapter (also when the
-// adapter could not be brought fully up to date) and reads the list entry at
-// position `record`, which must carry those low 16 bits as its index, as the
-// playback events give it. False when the disk holds no such recording.
+// Opens the disk as a volume with `reader`, as the catalogue build opens it,
+// and reads the list entry at position `record`, which must carry those low
+// 16 bits as its index, as the playback events give it. False when the disk
+// holds no such recording.
 QRIX_SDK_API bool OpenRecording(CatalogReader& reader, const wxString& disk, int record, _HisiList_t* recording);
 
 #endif

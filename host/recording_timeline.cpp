@@ -6,13 +6,13 @@
 
 RecordingTimeline::RecordingTimeline(CatalogReader& reader) : m_reader(reader)
 {
-    if (!reader.m_volume || !reader.m_volume->adapter)
+    if (!reader.Adapter())
         return;
-    m_ringSize = reader.m_volume->adapter->DataBlockMax;
+    m_ringSize = reader.Adapter()->DataBlockMax;
     reader.Setplaylist();
     for (std::int32_t position : reader.m_rowPositions) {
         _HisiList_t entry{};
-        if (reader.BlockOpe(reader.m_diskFile, 33, &entry, position, 1) < 0)
+        if (reader.ReadListEntries(position, 1, reinterpret_cast<char*>(&entry)) < 0)
             entry = _HisiList_t{};  // an entry gone bad since: it holds no block
         m_rows.push_back({entry.StartBlock, entry.EndBlock, entry.StartTime, entry.EndTime});
     }
@@ -58,7 +58,7 @@ void RecordingTimeline::LoadFrameCounts(int row)
         m_framesBefore.push_back(m_frames);
         _HisiBlockHeader_t header{};
         const long long block = (span.startBlock + place) % m_ringSize;
-        if (m_reader.BlockOpe(m_reader.m_diskFile, 65, &header, block, 1) > 0)
+        if (m_reader.ReadBlockHeaders(block, 1, reinterpret_cast<char*>(&header)) > 0)
             m_frames += std::clamp(header.FrameCount, 0, 262142);
     }
     m_averageFrames = m_frames / std::max<long long>(counted, 1);

@@ -51,8 +51,9 @@ public:
     void OnSwitchToFilePlay(wxCommandEvent& event);
 
     // Fields in the panel's order; those of the disk reader and the
-    // catalogue (m_recordCount, m_catalog, m_volume, the error register, the
-    // stream cursor, m_diskFile) live in the CatalogReader base.
+    // catalogue (m_recordCount, the catalogue, the volume, the error
+    // register, the stream cursor, the disk's source) live in the
+    // CatalogReader base.
     MorvanePlugin* m_plugin;
     wxGLContext* m_glContext;
     ChannelDecoder* m_decoder;
@@ -88,7 +89,7 @@ private:
     wxBitmapButton* MakeButton(int id, const wxString& image, const wxPoint& pos);
     void ConnectHandlers();
     void PlaceButtonRow(int y, int base);
-    void ShowBuildSummary(int drive, CatalogBuild result);
+    void ShowBuildSummary(int drive);
 
     // Playback shutdown shared by close and destruction; returns the address
     // of the connection record (0 when nothing played).

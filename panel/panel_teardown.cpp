@@ -63,8 +63,7 @@ MorvanePlugConfig::~MorvanePlugConfig()
     }
     DeleteCanvas();
     CloseDVRFS();
-    delete m_catalog;
-    m_catalog = nullptr;
+    ReleaseCatalog();
     EventManager::Get()->RemoveAllEventSinksFor(this);
 
     // The dialog goes with the panel: once the panel is gone, nothing of the

@@ -29,8 +29,9 @@ void MorvanePlugConfig::TakeDownDecoder(int eventId)
 
 void MorvanePlugConfig::SendMorvaneCommand(int index)
 {
-    // Only an entry of the catalogue can be played.
-    if (!m_catalog || index < 0 || index >= kCatalogCapacity)
+    // Only a row of the list can be played: a slot the build did not fill
+    // names no recording.
+    if (!Catalog() || index < 0 || index >= m_recordCount)
         return;
 
     unsigned int oldAddress = 0;
@@ -53,7 +54,7 @@ void MorvanePlugConfig::SendMorvaneCommand(int index)
 
     QrixFileEvent connect(iEVT_HDD_CONNECTED, iEVT_MORVANE_WINDOW);
     connect.address = kLoopback;
-    connect.record = static_cast<std::uint16_t>(m_catalog->Entries[index].Idx);
+    connect.record = static_cast<std::uint16_t>(Catalog()->Entries[index].Idx);
     connect.path = m_diskPath;
     connect.panelId = m_panelId;
     connect.channelCount = 0;

@@ -46,7 +46,7 @@ protected:
     {
         std::vector<int> indices;
         for (int i = 0; i < reader_.m_recordCount; ++i)
-            indices.push_back(reader_.m_catalog->Entries[i].Idx);
+            indices.push_back(reader_.Catalog()->Entries[i].Idx);
         return indices;
     }
 };
@@ -68,11 +68,11 @@ TEST_F(CatalogBuildTest, SpanIsReadFromTheOldestAroundTheRingToTheNewest)
         ASSERT_EQ(Build(WriteListed(c.positions, layout, std::to_string(c.listMax) + ".img")), CatalogBuild::kBuilt);
         const std::vector<int> rows(c.positions.begin(), c.positions.begin() + c.rows);
         EXPECT_EQ(Indices(), rows);
-        EXPECT_EQ(reader_.m_catalog->SpanCount, c.spanCount);
-        EXPECT_EQ(reader_.m_catalog->Entries[0].StartTime, 1000 * c.positions[0]);
-        EXPECT_EQ(reader_.m_catalog->Entries[c.rows - 1].EndTime, 1000 * c.positions[c.rows - 1] + 500);
+        EXPECT_EQ(reader_.Catalog()->SpanCount, c.spanCount);
+        EXPECT_EQ(reader_.Catalog()->Entries[0].StartTime, 1000 * c.positions[0]);
+        EXPECT_EQ(reader_.Catalog()->Entries[c.rows - 1].EndTime, 1000 * c.positions[c.rows - 1] + 500);
         if (c.rows < 8192) {
-            EXPECT_EQ(reader_.m_catalog->Entries[c.rows].Idx, -1);
+            EXPECT_EQ(reader_.Catalog()->Entries[c.rows].Idx, -1);
         }
     }
 }
@@ -108,8 +108,8 @@ TEST_P(DamagedListTest, DamagedEntryCostsOnlyItsOwnRow)
     ASSERT_EQ(Build(path), CatalogBuild::kBuilt);
     EXPECT_EQ(Indices(), GetParam().rows);
     EXPECT_EQ(reader_.m_skippedPositions, GetParam().skipped);
-    EXPECT_EQ(reader_.m_catalog->SpanCount, GetParam().spanCount);
-    EXPECT_EQ(reader_.m_errorCode, 50);
+    EXPECT_EQ(reader_.Catalog()->SpanCount, GetParam().spanCount);
+    EXPECT_EQ(reader_.ErrorCode(), 50);
 
     // Each row plays and extracts its own entry's recording.
     for (int row = 0; row < reader_.m_recordCount; ++row) {
@@ -163,17 +163,17 @@ TEST_F(CatalogBuildTest, NewestBelowZeroAndBelowTheOldestCountsAsWrapped)
 {
     const std::string path = WriteListed({3, 4, 5});  // a ring of 16
     ASSERT_EQ(Build(path), CatalogBuild::kBuilt);
-    reader_.m_volume->adapter->LastList.Idx = -2;  // -2 + 16 = 14: read from 3 until the first unreadable
+    reader_.MutableAdapter()->LastList.Idx = -2;  // -2 + 16 = 14: read from 3 until the first unreadable
     reader_.Setplaylist();
     EXPECT_EQ(Indices(), (std::vector<int>{3, 4, 5}));
-    EXPECT_EQ(reader_.m_catalog->SpanCount, 12);
+    EXPECT_EQ(reader_.Catalog()->SpanCount, 12);
 
-    reader_.m_volume->adapter->LastList.Idx = -20;  // still below the oldest: nothing, and no span
-    reader_.m_catalog->SpanCount = 77;
+    reader_.MutableAdapter()->LastList.Idx = -20;  // still below the oldest: nothing, and no span
+    reader_.MutableCatalog()->SpanCount = 77;
     reader_.Setplaylist();
     EXPECT_EQ(reader_.m_recordCount, 0);
-    EXPECT_EQ(reader_.m_catalog->SpanCount, 77);
-    EXPECT_EQ(reader_.m_catalog->Entries[0].Idx, -1);
+    EXPECT_EQ(reader_.Catalog()->SpanCount, 77);
+    EXPECT_EQ(reader_.Catalog()->Entries[0].Idx, -1);
 }
 
 // What the panel's status line says of a build, in plain words (the failures
@@ -201,7 +201,8 @@ TEST_F(CatalogBuildTest, BuildIsDescribedInPlainWords)
                                             GeneratedRecording(1, 1, 1, 1700003600, 1700007200, 8, 1, 16),
                                             GeneratedRecording(2, 2, 2, 1700010000, 1700010100, 8, 1, 16)},
                                            c.damage, std::to_string(n++) + ".img");
-        EXPECT_EQ(DescribeBuild(Build(path), reader_, path), c.summary);
+        Build(path);
+        EXPECT_EQ(DescribeBuild(reader_), c.summary);
     }
 }
 

@@ -31,16 +31,16 @@ TEST_P(AdapterSearchTest, ChoosesTheEndOfTheFirstRunOfValidSlots)
     iotrace::Reset();
 
     const bool found = GetParam().chosen >= 0;
-    ASSERT_EQ(reader_.BlockOpe(reader_.m_diskFile, 2, nullptr, 0, 0), found ? 1 : -1);
+    ASSERT_EQ(reader_.BlockOpe(nullptr, 2, nullptr, 0, 0), found ? 1 : -1);
     if (GetParam().reads > 0) {
         EXPECT_EQ(iotrace::Reads(path).size(), GetParam().reads);
     }
     if (found) {
         EXPECT_EQ(Adapter().Idx, GetParam().chosen);
-        EXPECT_EQ(reader_.m_errorCode, 0);
+        EXPECT_EQ(reader_.ErrorCode(), 0);
     } else {
-        EXPECT_EQ(reader_.m_errorCode, 36);
-        EXPECT_EQ(reader_.m_volume->adapter, nullptr);
+        EXPECT_EQ(reader_.ErrorCode(), 36);
+        EXPECT_EQ(reader_.Adapter(), nullptr);
     }
 }
 
@@ -66,9 +66,9 @@ TEST_F(AdapterTest, AdapterWhoseRingsAreLargerThanAnyRecordersIsRefused)
     data.dataBlockMax = (1 << 22) + 1, data.blockCount = INT_MAX, data.blockSizeShift = 20, data.imageSize = 1 << 30;
     for (const Layout& layout : {list, data}) {
         EXPECT_EQ(OpenAndSearch(WriteDisk(layout, {}, {}, std::to_string(layout.listMax) + ".img")), -1);
-        EXPECT_EQ(reader_.m_errorCode, 82);
+        EXPECT_EQ(reader_.ErrorCode(), 82);
         EXPECT_EQ(ErrorText(), "FUNCTION[1250]");
-        EXPECT_EQ(reader_.m_volume->adapter, nullptr);
+        EXPECT_EQ(reader_.Adapter(), nullptr);
     }
 }
 
@@ -80,16 +80,16 @@ TEST_F(AdapterTest, EmptyRingsAreAcceptedAndNothingDividesByThem)
     layout.firstListIdx = 3;
     layout.lastListIdx = 2;  // claims recordings in a ring of none
     EXPECT_EQ(OpenAndSearch(WriteDisk(layout, {})), -1);  // the refresh cannot read an entry of an empty ring
-    EXPECT_EQ(reader_.m_errorCode, 65);                   // and so finds no oldest entry to read
-    ASSERT_NE(reader_.m_volume->adapter, nullptr);
+    EXPECT_EQ(reader_.ErrorCode(), 65);                   // and so finds no oldest entry to read
+    ASSERT_NE(reader_.Adapter(), nullptr);
     _HisiHeader_t header{};
     std::vector<unsigned char> payload(16);
-    reader_.m_streamBlock = 5;
+    reader_.SetStreamCursor(5, 0);
     for (const auto& [direction, code] : {std::pair{1, 70}, std::pair{0, 65}}) {
-        EXPECT_EQ(reader_.get_stream(reader_.m_diskFile, payload.data(), &header, Adapter().FirstList,
+        EXPECT_EQ(reader_.get_stream(nullptr, payload.data(), &header, Adapter().FirstList,
                                      Adapter().LastList, direction),
                   -1);
-        EXPECT_EQ(reader_.m_errorCode, code);
+        EXPECT_EQ(reader_.ErrorCode(), code);
     }
 }
 
@@ -109,7 +109,7 @@ TEST_F(AdapterTest, ListSpanLongerThanTheRingIsWalkedOneTurn)
     EXPECT_EQ(Adapter().FirstList.Idx, 0);
     EXPECT_EQ(Adapter().LastList.Idx, 2);
     iotrace::Reset();
-    EXPECT_EQ(reader_.BlockOpe(reader_.m_diskFile, 35, nullptr, 0, INT_MAX), 1);
+    EXPECT_EQ(reader_.BlockOpe(nullptr, 35, nullptr, 0, INT_MAX), 1);
     EXPECT_EQ(Adapter().LastList.Idx, 2);
     EXPECT_LE(iotrace::Reads(path).size(), 2u * 16 + 4);  // both copies of one turn, a few records
 }
@@ -148,8 +148,8 @@ TEST_P(RefreshTest, SpanRunsFromTheOldestToTheNewestReadableEntry)
         damage.insert(damage.end(), {{Target::ListEntry, position}, {Target::ListMirror, position}});
 
     EXPECT_EQ(OpenAndSearch(WriteDisk(layout, recordings, damage)), c.result);
-    EXPECT_EQ(reader_.m_errorCode, c.code);
-    ASSERT_NE(reader_.m_volume->adapter, nullptr);  // installed before the refresh
+    EXPECT_EQ(reader_.ErrorCode(), c.code);
+    ASSERT_NE(reader_.Adapter(), nullptr);  // installed before the refresh
     if (c.result < 0)
         return;
     EXPECT_EQ(Adapter().FirstList.Idx, c.oldest);
@@ -158,7 +158,7 @@ TEST_P(RefreshTest, SpanRunsFromTheOldestToTheNewestReadableEntry)
     EXPECT_EQ(Adapter().CurBlockHeader.BlockIdx, c.newestBlock);
     EXPECT_EQ(Adapter().StartTime, c.start);
     EXPECT_EQ(Adapter().EndTime, c.end);
-    EXPECT_EQ(reader_.m_volume->unreadableListPositions, c.damagedInBothCopies);
+    EXPECT_EQ(reader_.Volume()->unreadableListPositions, c.damagedInBothCopies);
 }
 
 INSTANTIATE_TEST_SUITE_P(
@@ -180,14 +180,16 @@ INSTANTIATE_TEST_SUITE_P(
 struct NewestHeaderCase {
     const char* name;
     std::vector<int> damagedHeaders;
-    int result;
-    int newestBlock;
+    int newestBlock;  // as the refresh leaves it
+    bool unreadable;  // no header of the newest recording reads
 };
 
 class NewestHeaderTest : public DiskTest, public ::testing::WithParamInterface<NewestHeaderCase> {};
 
 // The newest recording runs from block 190 across the end of a ring of 200
-// blocks to block 5; a damaged last header gives way to the newest readable one.
+// blocks to block 5; a damaged last header gives way to the newest readable
+// one. With none readable the volume still opens: the other recording is
+// there, and the newest is listed and marked.
 TEST_P(NewestHeaderTest, DamagedLastHeaderIsReplacedByTheNewestReadableOne)
 {
     Layout layout = SmallLayout();
@@ -195,25 +197,47 @@ TEST_P(NewestHeaderTest, DamagedLastHeaderIsReplacedByTheNewestReadableOne)
     std::vector<Damage> damage;
     for (int block : GetParam().damagedHeaders)
         damage.push_back({Target::BlockHeader, block});
-    ASSERT_EQ(OpenAndSearch(WriteDisk(layout,
-                                      {GeneratedRecording(0, 100, 110, 1000, 2000, 200, 1, 64),
-                                       GeneratedRecording(1, 190, 5, 3000, 4000, 200, 1, 64)},
-                                      damage)),
-              GetParam().result);
-    EXPECT_EQ(reader_.m_errorCode, 52);
-    if (GetParam().result > 0) {
-        EXPECT_EQ(Adapter().LastList.EndBlock, GetParam().newestBlock);
+    ASSERT_EQ(Build(WriteDisk(layout,
+                              {GeneratedRecording(0, 100, 110, 1000, 2000, 200, 1, 64),
+                               GeneratedRecording(1, 190, 5, 3000, 4000, 200, 1, 64)},
+                              damage)),
+              CatalogBuild::kBuilt);
+    EXPECT_EQ(reader_.ErrorCode(), kErrBlockHeader);
+    EXPECT_EQ(reader_.m_recordCount, 2);
+    EXPECT_EQ(Adapter().LastList.EndBlock, GetParam().newestBlock);
+    EXPECT_EQ(reader_.Status().newestBlockUnreadable, GetParam().unreadable);
+    EXPECT_EQ(reader_.m_newestBlockUnreadableRow, GetParam().unreadable ? 1 : -1);
+    if (!GetParam().unreadable) {
         EXPECT_EQ(Adapter().CurBlockHeader.BlockIdx, GetParam().newestBlock);
     }
 }
 
 INSTANTIATE_TEST_SUITE_P(
     Headers, NewestHeaderTest,
-    ::testing::Values(NewestHeaderCase{"ThreeDamaged", {5, 4, 3}, 1, 2},
-                      NewestHeaderCase{"BackAcrossTheStartOfTheRing", {5, 4, 3, 2, 1, 0}, 1, 199},
+    ::testing::Values(NewestHeaderCase{"ThreeDamaged", {5, 4, 3}, 2, false},
+                      NewestHeaderCase{"BackAcrossTheStartOfTheRing", {5, 4, 3, 2, 1, 0}, 199, false},
                       NewestHeaderCase{"NoneReadable",
-                                       {190, 191, 192, 193, 194, 195, 196, 197, 198, 199, 0, 1, 2, 3, 4, 5}, -1, 0}),
+                                       {190, 191, 192, 193, 194, 195, 196, 197, 198, 199, 0, 1, 2, 3, 4, 5}, 5, true}),
     CaseName<NewestHeaderCase>);
+
+// The newest block's header reads but none of its frames does: the block is
+// unreadable, and the recording's frames before it still extract.
+TEST_F(AdapterTest, NewestBlockWithoutAReadableFrameCostsOnlyItsFrames)
+{
+    std::vector<Damage> damage;
+    for (int frame = 0; frame < 3; ++frame)
+        damage.push_back({Target::IndexEntry, 1, frame});
+    ASSERT_EQ(Build(WriteDisk(SmallLayout(), {GeneratedRecording(0, 0, 1, 100, 200, 8, 3, 1000)}, damage)),
+              CatalogBuild::kBuilt);
+    EXPECT_EQ(reader_.ErrorCode(), kErrIndexEntry);
+    EXPECT_EQ(reader_.m_newestBlockUnreadableRow, 0);
+    _HisiList_t recording{};
+    ASSERT_TRUE(dvrfstool::RecordingOfRow(reader_, 0, &recording));
+    dvrfstool::ExtractResult result;
+    EXPECT_EQ(Extracted(reader_, recording, &result).size(), 3u * 1000);
+    EXPECT_EQ(result.frames, 3);
+    EXPECT_EQ(result.skippedFrames, 3);
+}
 
 TEST_F(AdapterTest, NewestFrameIsTheLastReadableIndexEntryThatFits)
 {
@@ -223,7 +247,7 @@ TEST_F(AdapterTest, NewestFrameIsTheLastReadableIndexEntryThatFits)
     EXPECT_EQ(Adapter().CurBlockHeader.FrameCount, 2);
     EXPECT_EQ(Adapter().LastFrame.DataOffset, 1000);
     EXPECT_EQ(Adapter().LastFrame.DataSize, 1000);
-    EXPECT_EQ(reader_.m_errorCode, 53);
+    EXPECT_EQ(reader_.ErrorCode(), 53);
 
     // A header claiming 2^31 - 1 frames is walked down from the last entry a block can hold.
     const std::string path =

@@ -15,7 +15,8 @@ constexpr std::int64_t kBlock = 4096;
 
 class RawReadTest : public DiskTest {
 protected:
-    // A file of `size` bytes whose byte i is PatternByte(i), opened read-only.
+    // A file of `size` bytes whose byte i is PatternByte(i), opened as the
+    // reader's source.
     void OpenPatternFile(std::size_t size)
     {
         path_ = dir_ + "/pattern.bin";
@@ -24,12 +25,11 @@ protected:
             out.put(static_cast<char>(PatternByte(i)));
         out.close();
         Refingerprint(path_);
-        ASSERT_TRUE(file_.Open(path_, wxFile::read));
+        ASSERT_EQ(reader_.OpenSource(path_), 1);
     }
     static unsigned char PatternByte(std::size_t i) { return static_cast<unsigned char>(i * 7 % 251); }
 
     std::string path_;
-    wxFile file_;
 };
 
 TEST_F(RawReadTest, ReadsWholeSectorsAndDeliversExactlyTheBytesAskedFor)
@@ -37,12 +37,12 @@ TEST_F(RawReadTest, ReadsWholeSectorsAndDeliversExactlyTheBytesAskedFor)
     OpenPatternFile(8192);
     unsigned char dest[512];
 
-    ASSERT_EQ(reader_.HddataRead(&file_, reinterpret_cast<char*>(dest), 1000, 100), 1);
+    ASSERT_EQ(reader_.ReadSectors(reinterpret_cast<char*>(dest), 1000, 100), 1);
     for (int i = 0; i < 100; ++i)
         ASSERT_EQ(dest[i], PatternByte(1000 + i));
-    ASSERT_EQ(reader_.HddataRead(&file_, reinterpret_cast<char*>(dest), 512, 512), 1);
+    ASSERT_EQ(reader_.ReadSectors(reinterpret_cast<char*>(dest), 512, 512), 1);
     EXPECT_EQ(dest[0], PatternByte(512));
-    EXPECT_EQ(reader_.HddataRead(&file_, reinterpret_cast<char*>(dest), 0, 0), -1);
+    EXPECT_EQ(reader_.ReadSectors(reinterpret_cast<char*>(dest), 0, 0), -1);
 
     const std::vector<iotrace::ReadCall> reads = iotrace::Reads(path_);
     ASSERT_EQ(reads.size(), 2u);
@@ -58,14 +58,13 @@ TEST_F(RawReadTest, RefusesWhatCannotBeReadWithoutTouchingTheDestination)
     char dest[16] = {};
     iotrace::FailReads(path_, 2048, 1);
 
-    EXPECT_EQ(reader_.HddataRead(&file_, dest, 2100, 4), -1);               // a failing sector
-    EXPECT_EQ(reader_.HddataRead(&file_, dest, UINT64_MAX - 1, 4), -1);     // offset + length overflows
-    EXPECT_EQ(reader_.HddataRead(&file_, dest, 1ull << 63, 4), -1);         // beyond any seek
-    EXPECT_EQ(reader_.HddataRead(&file_, dest, 0, 1ul << 40), -1);          // larger than any record
-    EXPECT_EQ(reader_.HddataRead(nullptr, dest, 0, 4), -1);
-    wxFile closed;
-    EXPECT_EQ(reader_.HddataRead(&closed, dest, 0, 4), -1);
-    EXPECT_EQ(reader_.m_errorCode, 0);  // raw reads write nothing to the register
+    EXPECT_EQ(reader_.ReadSectors(dest, 2100, 4), -1);               // a failing sector
+    EXPECT_EQ(reader_.ReadSectors(dest, UINT64_MAX - 1, 4), -1);     // offset + length overflows
+    EXPECT_EQ(reader_.ReadSectors(dest, 1ull << 63, 4), -1);         // beyond any seek
+    EXPECT_EQ(reader_.ReadSectors(dest, 0, 1ul << 40), -1);          // larger than any record
+    EXPECT_EQ(reader_.ErrorCode(), kErrNone);  // raw reads write nothing to the register
+    CatalogReader unopened;
+    EXPECT_EQ(unopened.ReadSectors(dest, 0, 4), -1);
 }
 
 class BlockReadTest : public DiskTest {
@@ -98,7 +97,7 @@ TEST_F(BlockReadTest, MapsLogicalBlocksAcrossTheSkippedPhysicalBlocksInSectorPie
     iotrace::Reset();
 
     char got[2] = {};
-    ASSERT_EQ(reader_.BlockRead(reader_.m_diskFile, 2097151, got, 2), 1);
+    ASSERT_EQ(reader_.BlockRead(nullptr, 2097151, got, 2), 1);
     EXPECT_EQ(got[0], 'A');
     EXPECT_EQ(got[1], 'B');
     const std::vector<iotrace::ReadCall> reads = iotrace::Reads(path);
@@ -111,7 +110,7 @@ TEST_F(BlockReadTest, MapsLogicalBlocksAcrossTheSkippedPhysicalBlocksInSectorPie
     // Three blocks: one read each, none merged.
     std::vector<char> span(kBlock + 2);
     iotrace::Reset();
-    ASSERT_EQ(reader_.BlockRead(reader_.m_diskFile, 2097151, span.data(), static_cast<int>(span.size())), 1);
+    ASSERT_EQ(reader_.BlockRead(nullptr, 2097151, span.data(), static_cast<int>(span.size())), 1);
     EXPECT_EQ(span.front(), 'A');
     EXPECT_EQ(span[1], 'B');
     EXPECT_EQ(iotrace::Reads(path).size(), 3u);
@@ -125,8 +124,8 @@ TEST_F(BlockReadTest, RefusesReadsOutsideTheBlockSpaceOrWithUnusableArguments)
     layout.blockCount = 1000;
     const std::string path = OpenSmallDisk(layout);
     char got[4] = {'x', 'y', 'z', 'w'};
-    EXPECT_EQ(reader_.BlockRead(reader_.m_diskFile, 4095999, got, 1), 1);
-    EXPECT_EQ(reader_.BlockRead(reader_.m_diskFile, 0, got, 0), 1);
+    EXPECT_EQ(reader_.BlockRead(nullptr, 4095999, got, 1), 1);
+    EXPECT_EQ(reader_.BlockRead(nullptr, 0, got, 0), 1);
     got[0] = 'x';
     iotrace::Reset();
     const struct {
@@ -140,20 +139,20 @@ TEST_F(BlockReadTest, RefusesReadsOutsideTheBlockSpaceOrWithUnusableArguments)
         {-1, 1, true, 36},      {0, -1, true, 36},      {0, 4, false, 36},
     };
     for (const auto& r : refused) {
-        reader_.m_errorCode = 0;
-        EXPECT_EQ(reader_.BlockRead(reader_.m_diskFile, r.position, r.destination ? got : nullptr, r.size), -1);
-        EXPECT_EQ(reader_.m_errorCode, r.code) << r.position << " " << r.size;
+        reader_.ClearError();
+        EXPECT_EQ(reader_.BlockRead(nullptr, r.position, r.destination ? got : nullptr, r.size), -1);
+        EXPECT_EQ(reader_.ErrorCode(), r.code) << r.position << " " << r.size;
     }
     EXPECT_EQ(got[0], 'x');
     EXPECT_TRUE(iotrace::Reads(path).empty());
-    ASSERT_EQ(reader_.BlockRead(reader_.m_diskFile, 4095999, got, 2), -1);
+    ASSERT_EQ(reader_.BlockRead(nullptr, 4095999, got, 2), -1);
     EXPECT_EQ(ErrorText(), "FUNCTION[1150]Pos=4095999, Size=2, OffsetAddressSpace=0, OffsetBlockSpace=1048576");
-    ASSERT_EQ(reader_.BlockRead(reader_.m_diskFile, -1, got, 1), -1);
+    ASSERT_EQ(reader_.BlockRead(nullptr, -1, got, 1), -1);
     EXPECT_EQ(ErrorText(), "FUNCTION[1141]");
 
     reader_.CloseDVRFS();
     EXPECT_EQ(reader_.BlockRead(nullptr, 0, got, 4), -1);
-    EXPECT_EQ(reader_.m_errorCode, 38);
+    EXPECT_EQ(reader_.ErrorCode(), 38);
     wxInt64 offset = 0;
     EXPECT_EQ(reader_.BlockShift(3, &offset), -1);
 }
@@ -167,10 +166,9 @@ TEST_F(BlockReadTest, ErrorTextIsCutToItsBuffer)
     Refingerprint(path);
     ASSERT_EQ(Open(path), 1);
 
-    std::memset(reader_.m_errorText + 131, 0x55, 1);
     char got[1];
-    EXPECT_EQ(reader_.BlockRead(reader_.m_diskFile, INT64_MAX, got, INT_MAX), -1);  // refused before any read
-    EXPECT_EQ(std::strlen(reader_.m_errorText), 131u);
+    EXPECT_EQ(reader_.BlockRead(nullptr, INT64_MAX, got, INT_MAX), -1);  // refused before any read
+    EXPECT_EQ(std::strlen(reader_.ErrorText()), 131u);
     EXPECT_EQ(ErrorText().substr(0, 37), "FUNCTION[1150]Pos=9223372036854775807");
 }
 

@@ -33,7 +33,7 @@ Digest Read(const std::string& path)
 {
     Digest digest;
     CatalogReader reader;
-    if (reader.BuildCatalog(wxString::FromUTF8(path.c_str())) != CatalogBuild::kBuilt)
+    if (reader.BuildCatalog(path) != CatalogBuild::kBuilt)
         return digest;
     digest.rows = reader.m_recordCount;
     for (int row = 0; row < reader.m_recordCount; ++row) {
@@ -47,7 +47,7 @@ Digest Read(const std::string& path)
     }
     CatalogReader verifier;
     const dvrfstool::VerifyResult verified =
-        dvrfstool::VerifyDisk(verifier, wxString::FromUTF8(path.c_str()), [](const std::string&) {});
+        dvrfstool::VerifyDisk(verifier, path, [](const std::string&) {});
     digest.verifyChecked = verified.checked;
     digest.verifyDamaged = verified.damaged;
     return digest;
@@ -106,10 +106,10 @@ TEST_F(ImageSourceTest, SplitAndE01ImagesReadAsTheRawImage)
         EXPECT_EQ(other.verifyDamaged, 0) << image;
     }
     CatalogReader reader;
-    ASSERT_EQ(reader.OpenDVRFS(wxString::FromUTF8((dir_ + "/case.E01").c_str())), 1);
-    ASSERT_NE(reader.m_imageSource, nullptr);
-    EXPECT_EQ(reader.m_imageSource->Kind(), "E01 image, 1 segment");
-    EXPECT_EQ(reader.m_imageSource->Size(), std::filesystem::file_size(raw_));
+    ASSERT_EQ(reader.OpenDisk(dir_ + "/case.E01"), 1);
+    ASSERT_NE(reader.Source(), nullptr);
+    EXPECT_EQ(reader.Source()->Kind(), "E01 image, 1 segment");
+    EXPECT_EQ(reader.Source()->Size(), std::filesystem::file_size(raw_));
 }
 
 // A byte flipped in a chunk of the segment file, inside data block 1's
@@ -135,10 +135,10 @@ TEST_F(ImageSourceTest, DamagedE01ChunkLeavesTheRestReadable)
     std::ofstream(e01, std::ios::binary).write(segment.data(), static_cast<std::streamsize>(segment.size()));
 
     CatalogReader reader;
-    ASSERT_EQ(reader.OpenDVRFS(wxString::FromUTF8(e01.c_str())), 1);
+    ASSERT_EQ(reader.OpenDisk(e01), 1);
     char byte = 0;
-    EXPECT_EQ(reader.m_imageSource->Read(at, &byte, 1), -1);
-    EXPECT_EQ(reader.m_imageSource->Read(at - 32768, &byte, 1), 1);
+    EXPECT_EQ(reader.ReadSectors(&byte, at, 1), -1);
+    EXPECT_EQ(reader.ReadSectors(&byte, at - 32768, 1), 1);
 
     const Digest damaged = Read(e01);
     EXPECT_EQ(damaged.rows, 2);

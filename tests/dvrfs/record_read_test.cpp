@@ -28,25 +28,24 @@ protected:
     void Search()
     {
         ASSERT_EQ(OpenAndSearch(path_), 1);
-        reader_.m_errorCode = 0;
-        reader_.m_errorText[0] = '\0';
+        reader_.ClearError();
     }
 
     int ReadList(wxInt64 index, int count, void* buffer)
     {
-        return reader_.BlockOpe(reader_.m_diskFile, 33, buffer, index, count);
+        return reader_.BlockOpe(nullptr, 33, buffer, index, count);
     }
     int ReadHeaders(wxInt64 block, int count, void* buffer)
     {
-        return reader_.BlockOpe(reader_.m_diskFile, 65, buffer, block, count);
+        return reader_.BlockOpe(nullptr, 65, buffer, block, count);
     }
     int ReadIndex(wxInt64 block, int first, int count, void* buffer)
     {
-        return reader_.DataBlockOpe(reader_.m_diskFile, 'Q', buffer, block, first, count);
+        return reader_.DataBlockOpe(nullptr, 'Q', buffer, block, first, count);
     }
     int ReadPayload(wxInt64 block, int offset, int length, void* buffer)
     {
-        return reader_.DataBlockOpe(reader_.m_diskFile, 'a', buffer, block, offset, length);
+        return reader_.DataBlockOpe(nullptr, 'a', buffer, block, offset, length);
     }
     std::string path_;
 };
@@ -55,7 +54,7 @@ TEST_F(RecordReadTest, ReadsOutsideTheirRingOrAreaAreRefusedWithCodeAndText)
 {
     Search();
     char b[3 * 128];
-    auto Widen = [this] { reader_.m_volume->adapter->DataBlockMax = 1000; };
+    auto Widen = [this] { reader_.MutableAdapter()->DataBlockMax = 1000; };
     const struct {
         const char* what;
         std::function<int()> read;
@@ -83,7 +82,7 @@ TEST_F(RecordReadTest, ReadsOutsideTheirRingOrAreaAreRefusedWithCodeAndText)
     };
     for (const auto& r : refused) {
         EXPECT_EQ(r.read(), -1) << r.what;
-        EXPECT_EQ(reader_.m_errorCode, r.code) << r.what;
+        EXPECT_EQ(reader_.ErrorCode(), r.code) << r.what;
         EXPECT_EQ(ErrorText().substr(0, std::strlen(r.text)), r.text) << r.what;
     }
 }
@@ -111,14 +110,14 @@ TEST_F(RecordReadTest, OperationsNeedAnAdapterAndIgnoreUnknownCodes)
     ASSERT_EQ(Open(path_), 1);
     char buffer[128];
     EXPECT_EQ(ReadList(0, 1, buffer), -1);
-    EXPECT_EQ(reader_.m_errorCode, 38);
+    EXPECT_EQ(reader_.ErrorCode(), 38);
     EXPECT_EQ(ErrorText(), "FUNCTION[1130]");
     EXPECT_EQ(ReadHeaders(0, 1, buffer), -1);
     EXPECT_EQ(ReadIndex(0, 0, 1, buffer), -1);
     EXPECT_EQ(ReadPayload(0, 0, 1, buffer), -1);
-    EXPECT_EQ(reader_.BlockOpe(reader_.m_diskFile, 35, nullptr, 0, 1), -1);
-    EXPECT_EQ(reader_.BlockOpe(reader_.m_diskFile, 'x', buffer, 0, 1), 1);
-    EXPECT_EQ(reader_.DataBlockOpe(reader_.m_diskFile, 'x', buffer, 0, 0, 1), 1);
+    EXPECT_EQ(reader_.BlockOpe(nullptr, 35, nullptr, 0, 1), -1);
+    EXPECT_EQ(reader_.BlockOpe(nullptr, 'x', buffer, 0, 1), 1);
+    EXPECT_EQ(reader_.DataBlockOpe(nullptr, 'x', buffer, 0, 0, 1), 1);
 }
 
 }  // namespace

@@ -23,8 +23,7 @@ protected:
     void Search() { ASSERT_EQ(OpenAndSearch(path_), 1); }
     void Place(wxInt64 block, std::int32_t frame)
     {
-        reader_.m_streamBlock = block;
-        reader_.m_streamFrame = frame;
+        reader_.SetStreamCursor(block, frame);
     }
 
     // One call; returns the block and entry number of the frame delivered,
@@ -33,7 +32,7 @@ protected:
     {
         _HisiHeader_t header{};
         std::vector<unsigned char> payload(1 << 16);
-        const int size = reader_.get_stream(reader_.m_diskFile, payload.data(), &header, first, last, direction);
+        const int size = reader_.get_stream(nullptr, payload.data(), &header, first, last, direction);
         if (size < 0)
             return {-1, -1};
         payload.resize(static_cast<std::size_t>(size));
@@ -82,7 +81,7 @@ TEST_F(StreamTest, ForwardRunsAcrossTheEndOfTheRingThenRestartsAtTheOldestRecord
         expected.push_back({b, 0});
     expected.push_back({10, 0});  // past the range: the oldest recording's first block
     EXPECT_EQ(got, expected);
-    EXPECT_EQ(reader_.m_streamBlock, 10);
+    EXPECT_EQ(reader_.StreamBlock(), 10);
 }
 
 TEST_F(StreamTest, RingWithoutAnyFrameEndsTheWalkInsteadOfCirclingForever)
@@ -94,12 +93,12 @@ TEST_F(StreamTest, RingWithoutAnyFrameEndsTheWalkInsteadOfCirclingForever)
     Search();
     Place(3, 0);
     EXPECT_EQ(Forward(), std::make_pair(-1, -1));
-    EXPECT_EQ(reader_.m_errorCode, 54);
+    EXPECT_EQ(reader_.ErrorCode(), 54);
     EXPECT_EQ(ErrorText(), "FUNCTION[1710]");
     Place(3, -1);
-    reader_.m_errorCode = 0;
+    reader_.ClearError();
     EXPECT_EQ(Backward(), std::make_pair(-1, -1));
-    EXPECT_EQ(reader_.m_errorCode, 54);
+    EXPECT_EQ(reader_.ErrorCode(), 54);
 }
 
 TEST_F(StreamTest, TerabyteDiskCostsOnlyTheBytesWrittenAndPlaysAtItsFarEnd)
@@ -137,20 +136,20 @@ TEST_F(StreamTest, StreamReadDeliversTheSpanOfARunOfFrames)
 
     _HisiHeader_t entries[3];
     std::vector<unsigned char> payload(1500);
-    ASSERT_EQ(reader_.StreamRead(reader_.m_diskFile, 3, 0, 10, 3, entries, payload.data()), 1500);
+    ASSERT_EQ(reader_.StreamRead(nullptr, 3, 0, 10, 3, entries, payload.data()), 1500);
     EXPECT_EQ(entries[0].DataOffset, 2200);
     EXPECT_EQ(entries[2].DataOffset, 1000);
     EXPECT_EQ(std::vector<std::uint8_t>(payload.begin(), payload.end()), expected);
 
     // Without reading: the span of the entries as given.
-    EXPECT_EQ(reader_.StreamRead(reader_.m_diskFile, 0, 0, 0, 3, entries, nullptr), 1500);
-    EXPECT_EQ(reader_.StreamRead(reader_.m_diskFile, 3, 0, 10, 0, entries, payload.data()), -1);
+    EXPECT_EQ(reader_.StreamRead(nullptr, 0, 0, 0, 3, entries, nullptr), 1500);
+    EXPECT_EQ(reader_.StreamRead(nullptr, 3, 0, 10, 0, entries, payload.data()), -1);
 
     entries[0].DataOffset = INT_MAX;
     entries[0].DataSize = INT_MAX;
     entries[2].DataOffset = INT_MIN;
-    EXPECT_EQ(reader_.StreamRead(reader_.m_diskFile, 0, 0, 0, 3, entries, nullptr), -1);
-    EXPECT_EQ(reader_.m_errorCode, 74);
+    EXPECT_EQ(reader_.StreamRead(nullptr, 0, 0, 0, 3, entries, nullptr), -1);
+    EXPECT_EQ(reader_.ErrorCode(), 74);
 }
 
 }  // namespace

@@ -60,10 +60,10 @@ TEST_P(OpenTest, OpensOnTheFirstSoundCopyOrSaysWhyNot)
     const std::string path = WriteDisk(layout, {}, c.damage);
 
     EXPECT_EQ(Open(path), c.opened);
-    EXPECT_EQ(reader_.m_errorCode, c.code);
+    EXPECT_EQ(reader_.ErrorCode(), c.code);
     EXPECT_EQ(ErrorText(), c.text);
-    EXPECT_EQ(reader_.m_volume != nullptr, c.opened == 1);
-    EXPECT_EQ(reader_.m_diskFile != nullptr, c.opened == 1);
+    EXPECT_EQ(reader_.Volume() != nullptr, c.opened == 1);
+    EXPECT_EQ(reader_.Source() != nullptr, c.opened == 1);
     if (!c.reads.empty()) {
         EXPECT_EQ(ReadOffsets(path), c.reads);
     }
@@ -119,38 +119,38 @@ TEST_F(VolumeOpenTest, UnreadableSuperBlocksAreRefusedWithoutAllocatingTheirTabl
     std::filesystem::resize_file(zeros, 4 << 20);
     Refingerprint(zeros);
     EXPECT_EQ(Open(zeros), 0);
-    EXPECT_EQ(reader_.m_errorCode, 33);
+    EXPECT_EQ(reader_.ErrorCode(), 33);
     EXPECT_EQ(ErrorText(), "FUNCTION[909]0 != 252");
     EXPECT_EQ(ReadOffsets(zeros), (Offsets{0, 0, 0}));
-    ASSERT_NE(reader_.m_catalog, nullptr);  // allocated by the open, kept after the failure
-    EXPECT_EQ(reader_.m_catalog->Opened, 1);
+    ASSERT_NE(reader_.Catalog(), nullptr);  // allocated by the open, kept after the failure
+    EXPECT_EQ(reader_.Catalog()->Opened, 1);
 
     const std::string huge = WriteDisk(SmallLayout(), {});
     const std::uint32_t count = 0xFFFFFFFFu;
     PatchSuperBlocks(*image_, huge, 0x08, &count, sizeof count);
     Refingerprint(huge);
     EXPECT_EQ(Open(huge), 0);
-    EXPECT_EQ(reader_.m_errorCode, 40);
+    EXPECT_EQ(reader_.ErrorCode(), 40);
     EXPECT_EQ(ErrorText(), "FUNCTION[925]");
 }
 
 TEST_F(VolumeOpenTest, MissingDeviceLeavesTheRegisterAndASecondOpenClosesTheFirst)
 {
     EXPECT_EQ(Open(dir_ + "/no-such-disk"), 0);
-    EXPECT_EQ(reader_.m_errorCode, 0);
+    EXPECT_EQ(reader_.ErrorCode(), 0);
     reader_.CloseDVRFS();
     reader_.CloseDVRFS();
-    EXPECT_EQ(reader_.m_volume, nullptr);
+    EXPECT_EQ(reader_.Volume(), nullptr);
 
     Layout otherLayout = SmallLayout();
     otherLayout.blockTableCount = 9;
     ASSERT_EQ(Open(WriteDisk(SmallLayout(), {}, {}, "a.img")), 1);
-    RecordCatalog* catalog = reader_.m_catalog;
+    const RecordCatalog* catalog = reader_.Catalog();
     const int filesWithA = OpenFileCount();
     ASSERT_EQ(Open(WriteDisk(otherLayout, {}, {}, "b.img")), 1);
     EXPECT_EQ(OpenFileCount(), filesWithA);
-    EXPECT_EQ(reader_.m_catalog, catalog);
-    EXPECT_EQ(reader_.m_volume->superBlock.BlockTableCount, 9u);
+    EXPECT_EQ(reader_.Catalog(), catalog);
+    EXPECT_EQ(reader_.Volume()->superBlock.BlockTableCount, 9u);
 }
 
 TEST_F(VolumeOpenTest, FillLevelOfAnEmptyDataRingIsRefusedNotDividedByZero)
@@ -160,7 +160,7 @@ TEST_F(VolumeOpenTest, FillLevelOfAnEmptyDataRingIsRefusedNotDividedByZero)
     ASSERT_EQ(OpenAndSearch(WriteDisk(layout, {})), 1);
     EXPECT_EQ(reader_.GetInfo(35), 0);
     EXPECT_EQ(reader_.GetInfo(49), -1);
-    EXPECT_EQ(reader_.m_errorCode, 84);
+    EXPECT_EQ(reader_.ErrorCode(), 84);
     EXPECT_EQ(ErrorText(), "FUNCTION[1540]");
 }
 

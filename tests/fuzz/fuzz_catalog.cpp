@@ -17,10 +17,10 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
 {
     const std::string path = fuzzdisk::WriteImage(data, size);
     CatalogReader reader;
-    if (reader.BuildCatalog(wxString::FromUTF8(path.c_str())) == CatalogBuild::kBuilt) {
+    if (reader.BuildCatalog(path) == CatalogBuild::kBuilt) {
         for (int selector = 0; selector < 128; ++selector)
             reader.GetInfo(static_cast<char>(selector));
-        reader.BlockOpe(reader.m_diskFile, 5, nullptr, 0, 0);
+        reader.DumpAdapter();
     }
     return 0;
 }

@@ -23,7 +23,7 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
     static const std::string output = "/dev/shm/morvane-fuzz-export-" + std::to_string(::getpid()) + ".mp4";
     const std::string path = fuzzdisk::WriteImage(data, size);
     CatalogReader reader;
-    if (reader.BuildCatalog(wxString::FromUTF8(path.c_str())) != CatalogBuild::kBuilt)
+    if (reader.BuildCatalog(path) != CatalogBuild::kBuilt)
         return 0;
     dvrfstool::ExportRequest request;
     request.output = output;

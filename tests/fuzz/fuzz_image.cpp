@@ -101,12 +101,11 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
 {
     const bool ewf = size >= sizeof kEwfSignature && std::memcmp(data, kEwfSignature, sizeof kEwfSignature) == 0;
     const std::string path = ewf ? WriteEwfImage(data, size) : WriteSplitImage(data, size);
-    const wxString disk = wxString::FromUTF8(path.c_str());
     CatalogReader reader;
-    if (reader.BuildCatalog(disk) == CatalogBuild::kBuilt)
+    if (reader.BuildCatalog(path) == CatalogBuild::kBuilt)
         for (int selector = 0; selector < 128; ++selector)
             reader.GetInfo(static_cast<char>(selector));
     CatalogReader verifier;
-    dvrfstool::VerifyDisk(verifier, disk, [](const std::string&) {});
+    dvrfstool::VerifyDisk(verifier, path, [](const std::string&) {});
     return 0;
 }

@@ -11,28 +11,26 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
     static std::vector<unsigned char> payload(static_cast<std::size_t>(kPayloadAreaSize));
     const std::string path = fuzzdisk::WriteImage(data, size);
     CatalogReader reader;
-    if (reader.BuildCatalog(wxString::FromUTF8(path.c_str())) != CatalogBuild::kBuilt)
+    if (reader.BuildCatalog(path) != CatalogBuild::kBuilt)
         return 0;
-    const _HisiAdapter_t adapter = *reader.m_volume->adapter;
+    const _HisiAdapter_t adapter = *reader.Adapter();
     const int recordings = std::min(reader.m_recordCount, 4);
     for (int row = 0; row < recordings; ++row) {
         _HisiList_t recording{};
-        const std::int64_t position = adapter.ListMax > 0 ? reader.m_catalog->Entries[row].Idx % adapter.ListMax : 0;
-        if (reader.BlockOpe(reader.m_diskFile, 33, &recording, position, 1) < 0)
+        const std::int64_t position = adapter.ListMax > 0 ? reader.Catalog()->Entries[row].Idx % adapter.ListMax : 0;
+        if (reader.ReadListEntries(position, 1, reinterpret_cast<char*>(&recording)) < 0)
             continue;
         for (int direction : {1, 0}) {
-            reader.m_streamBlock = recording.StartBlock;
-            reader.m_streamFrame = direction ? 0 : 2;
+            reader.SetStreamCursor(recording.StartBlock, direction ? 0 : 2);
             for (int i = 0; i < 48; ++i) {
                 _HisiHeader_t header{};
-                if (reader.get_stream(reader.m_diskFile, payload.data(), &header, adapter.FirstList,
-                                      adapter.LastList, direction) < 0)
+                if (reader.NextFrame(payload.data(), &header, adapter.FirstList, adapter.LastList, direction) < 0)
                     break;
             }
         }
         _HisiHeader_t entries[8];
         for (int count = 1; count <= 8; count *= 2)
-            reader.StreamRead(reader.m_diskFile, 3, recording.StartBlock, 0, count, entries, payload.data());
+            reader.ReadFrameRun(3, recording.StartBlock, 0, count, entries, payload.data());
     }
     return 0;
 }

@@ -9,6 +9,6 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
     const std::string path = fuzzdisk::WriteImage(data, size);
     CatalogReader reader;
     long long lines = 0;
-    dvrfstool::VerifyDisk(reader, wxString::FromUTF8(path.c_str()), [&lines](const std::string&) { ++lines; });
+    dvrfstool::VerifyDisk(reader, path, [&lines](const std::string&) { ++lines; });
     return 0;
 }

@@ -61,7 +61,7 @@ TEST_F(PanelTest, PressOnALabelChoosesItAndClosesThePopup)
     gui::ClickAt(tree, gui::LabelCentre(tree, "Drivers"));
     EXPECT_EQ(p->m_driveCombo->GetValue(), "Drivers");
     EXPECT_TRUE(p->m_diskPath.empty());
-    EXPECT_EQ(p->m_catalog, nullptr);
+    EXPECT_EQ(p->Catalog(), nullptr);
     EXPECT_FALSE(p->m_driveCombo->IsPopupShown());
 
     p->m_driveCombo->Popup();

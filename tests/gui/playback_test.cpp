@@ -80,7 +80,7 @@ TEST_F(PlaybackTest, FirstPlayConnectsAndStartsADecoderForTheAnsweredChannels)
     EXPECT_EQ(panel_->m_glPane->Calls()[1].address, 0x7F000001u);
     EXPECT_EQ(CSoundout::Get()->Routes(), (std::vector<std::pair<int, int>>{{0, 0}}));
 
-    panel_->m_catalog->Entries[0].Idx = 70000;  // the record number is the low 16 bits of the list index
+    panel_->MutableCatalog()->Entries[0].Idx = 70000;  // the record number is the low 16 bits of the list index
     EXPECT_EQ(Play(0), (Lines{"disconnect 127.0.0.1 #1", "connect 127.0.0.1 #4464"}));
 }
 
@@ -143,6 +143,13 @@ TEST_F(PlaybackTest, PlayRestartsOnlyWhenStopped)
     FrameManager::Get()->ClearCalls();
     EXPECT_EQ(Press({kPlay}), (Lines{"connect 127.0.0.1 #2"}));  // stopped: the last recording again
     EXPECT_EQ(FrameManager::Get()->Calls().size(), 2u);          // the old channel's clean-up
+
+    // Another drive chosen while stopped: row 2 was a row of the drive before,
+    // so Play waits for a row of this one.
+    EXPECT_EQ(Press({kStop}), (Lines{"disconnect 127.0.0.1 #2"}));
+    WriteDisk(1, {{700, 800}, {900, 1000}, {1100, 1200}});
+    panel_->SendHddList(1);
+    EXPECT_EQ(Press({kPlay}), Lines{});
 }
 
 TEST_F(PlaybackTest, SwitchToFilePlayHandsOverOnceAndFindsNoCanvasTheSecondTime)

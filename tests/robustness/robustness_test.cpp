@@ -52,13 +52,13 @@ TEST_F(RobustnessTest, LargestListRingFullOfDamageCostsABoundedNumberOfReads)
     ASSERT_EQ(Build(path), CatalogBuild::kBuilt);
     const std::size_t buildReads = iotrace::ReadCount(path);
     EXPECT_EQ(reader_.m_recordCount, 1);
-    EXPECT_EQ(reader_.m_errorCode, 50);
+    EXPECT_EQ(reader_.ErrorCode(), 50);
 
     iotrace::Reset();
     iotrace::KeepReads(false);
     CatalogReader verifier;
     const dvrfstool::VerifyResult verified =
-        dvrfstool::VerifyDisk(verifier, wxString::FromUTF8(path.c_str()), [](const std::string&) {});
+        dvrfstool::VerifyDisk(verifier, path, [](const std::string&) {});
     const std::size_t verifyReads = iotrace::ReadCount(path);
     const long memoryAfter = PeakMemoryKiB();
 
@@ -68,7 +68,9 @@ TEST_F(RobustnessTest, LargestListRingFullOfDamageCostsABoundedNumberOfReads)
     // Verify: the search's refresh, then the two copies of every entry of the
     // span as the disk gives it, the slots, one recording.
     EXPECT_LE(verifyReads, 4u * kMaxListMax + 600);
-    EXPECT_EQ(verified.damaged, kMaxListMax - 1);
+    EXPECT_EQ(verified.damaged, 0);  // blank entries: never written, not damaged
+    EXPECT_EQ(verified.unwritten, kMaxListMax - 1);
+    EXPECT_EQ(reader_.m_unwrittenPositions.size(), static_cast<std::size_t>(kMaxListMax - 1));
 #ifndef __SANITIZE_ADDRESS__
     // (AddressSanitizer holds freed memory back in quarantine, so its peak
     // says nothing of what the reader keeps.)
@@ -81,7 +83,8 @@ TEST_F(RobustnessTest, LargestListRingFullOfDamageCostsABoundedNumberOfReads)
 
 // The worst data ring walk: the newest recording claims a ring of 2^20 blocks
 // whose headers are all missing, so the refresh's backward search tries them
-// all, once each.
+// all, once each, and then lists the recording as one whose newest block is
+// unreadable.
 TEST_F(RobustnessTest, NewestRecordingWithoutAnyHeaderIsSearchedOnceRoundTheRing)
 {
     Layout layout = SmallLayout();
@@ -98,7 +101,8 @@ TEST_F(RobustnessTest, NewestRecordingWithoutAnyHeaderIsSearchedOnceRoundTheRing
     Refingerprint(path);
 
     iotrace::KeepReads(false);
-    EXPECT_EQ(Build(path), CatalogBuild::kNoAdapter);
+    EXPECT_EQ(Build(path), CatalogBuild::kBuilt);
+    EXPECT_EQ(reader_.m_newestBlockUnreadableRow, 0);
     const std::size_t reads = iotrace::ReadCount(path);
     EXPECT_LE(reads, (1u << 20) + 400);
     std::printf("[ figures  ] data ring of %d blocks without headers: build gave up after %zu reads\n", 1 << 20,
@@ -127,7 +131,7 @@ TEST_F(RobustnessTest, ManyRecordingsClaimingTheWholeRingAreVerifiedBlockByBlock
     iotrace::KeepReads(false);
     long long headers = 0;
     const dvrfstool::VerifyResult verified =
-        dvrfstool::VerifyDisk(reader_, wxString::FromUTF8(path.c_str()), [&headers](const std::string& line) {
+        dvrfstool::VerifyDisk(reader_, path, [&headers](const std::string& line) {
             headers += line.find(" header") != std::string::npos;
         });
     EXPECT_EQ(verified.stage, dvrfstool::VerifyStage::kComplete);
@@ -146,11 +150,16 @@ TEST_F(RobustnessTest, ImageEndingInTheMiddleOfTheListStopsTheCatalogueThere)
     Refingerprint(path);
 
     // Entries 0 to 2 read; the newest of them has its data block beyond the
-    // end, so the adapter cannot be brought up to date: no catalogue, and the
-    // register names the missing header.
-    EXPECT_EQ(Build(path), CatalogBuild::kNoAdapter);
-    EXPECT_EQ(reader_.m_errorCode, 52);
-    EXPECT_EQ(reader_.m_recordCount, 0);
+    // end: the three are listed, the newest marked, the three entries past
+    // the cut damaged (not blank: their bytes are not there), and the image
+    // is said to be cut short.
+    EXPECT_EQ(Build(path), CatalogBuild::kBuilt);
+    EXPECT_EQ(reader_.ErrorCode(), kErrBlockHeader);
+    EXPECT_EQ(reader_.m_recordCount, 3);
+    EXPECT_EQ(reader_.m_newestBlockUnreadableRow, 2);
+    EXPECT_EQ(reader_.m_skippedPositions, (std::vector<std::int32_t>{3, 4, 5}));
+    EXPECT_TRUE(reader_.m_unwrittenPositions.empty());
+    EXPECT_TRUE(reader_.Status().Truncated());
 }
 
 TEST_F(RobustnessTest, UnreadableSectorCostsTheEntriesInItAndSaysSo)
@@ -166,8 +175,8 @@ TEST_F(RobustnessTest, UnreadableSectorCostsTheEntriesInItAndSaysSo)
     EXPECT_EQ(Build(path), CatalogBuild::kBuilt);
     EXPECT_EQ(reader_.m_recordCount, 4);
     EXPECT_EQ(reader_.m_skippedPositions, (std::vector<std::int32_t>{4, 5}));
-    EXPECT_EQ(reader_.m_errorCode, 50);
-    EXPECT_STREQ(reader_.m_errorText, "FUNCTION[1463]");
+    EXPECT_EQ(reader_.ErrorCode(), 50);
+    EXPECT_STREQ(reader_.ErrorText(), "FUNCTION[1463]");
 }
 
 TEST_F(RobustnessTest, DiskThatDisappearsFailsTheReadsAndTheNextBuild)
@@ -179,14 +188,13 @@ TEST_F(RobustnessTest, DiskThatDisappearsFailsTheReadsAndTheNextBuild)
     std::filesystem::resize_file(path, 0);
     std::filesystem::remove(path);
     Refingerprint(path);
-    reader_.m_streamBlock = 0;
-    reader_.m_streamFrame = 0;
+    reader_.SetStreamCursor(0, 0);
     std::vector<unsigned char> payload(16);
     _HisiHeader_t header{};
-    const _HisiAdapter_t adapter = *reader_.m_volume->adapter;
-    EXPECT_EQ(reader_.get_stream(reader_.m_diskFile, payload.data(), &header, adapter.FirstList, adapter.LastList, 1),
+    const _HisiAdapter_t adapter = *reader_.Adapter();
+    EXPECT_EQ(reader_.get_stream(nullptr, payload.data(), &header, adapter.FirstList, adapter.LastList, 1),
               -1);
-    EXPECT_EQ(reader_.m_errorCode, 52);
+    EXPECT_EQ(reader_.ErrorCode(), 52);
 
     EXPECT_EQ(Build(path), CatalogBuild::kNotOpened);
     EXPECT_EQ(reader_.m_recordCount, 0);

@@ -1,6 +1,7 @@
 #include "tests/support/disk_fixture.h"
 
 #include <fcntl.h>
+#include <sys/syscall.h>
 #include <unistd.h>
 
 #include <algorithm>
@@ -23,7 +24,8 @@ std::string FileFingerprint(const std::string& path)
         const off_t end = ::lseek(fd, at, SEEK_HOLE);
         hash = (hash ^ static_cast<std::uint64_t>(at)) * 1099511628211ull;
         while (at < end) {
-            const ssize_t n = ::pread(fd, buffer.data(), std::min<off_t>(end - at, buffer.size()), at);
+            // Straight from the kernel: the read trace neither counts nor fails these.
+            const ssize_t n = ::syscall(SYS_pread64, fd, buffer.data(), std::min<off_t>(end - at, buffer.size()), at);
             if (n <= 0)
                 break;
             for (ssize_t i = 0; i < n; ++i)
@@ -153,12 +155,12 @@ void DiskTest::Refingerprint(const std::string& path)
 
 int DiskTest::Open(const std::string& path)
 {
-    return reader_.OpenDVRFS(wxString::FromUTF8(path.c_str()));
+    return reader_.OpenDisk(path);
 }
 
 int DiskTest::OpenAndSearch(const std::string& path)
 {
-    if (Open(path) <= 0 || reader_.Checkconfig() <= 0)
+    if (Open(path) <= 0 || reader_.ConfiguredVersion() <= 0)
         return -1;
-    return reader_.BlockOpe(reader_.m_diskFile, 2, nullptr, 0, 0);
+    return reader_.FindAdapter();
 }

@@ -46,6 +46,13 @@ struct Damage {
     std::int64_t b = 0;
 };
 
+// The catalogue reader with the adapter in memory open to a test that
+// reshapes it.
+class TestReader : public CatalogReader {
+public:
+    using DvrDiskReader::MutableAdapter;
+};
+
 class DiskTest : public ::testing::Test {
 protected:
     void SetUp() override;
@@ -67,13 +74,13 @@ protected:
     // first: configured-recorder check and adapter search.
     int Open(const std::string& path);
     int OpenAndSearch(const std::string& path);
-    CatalogBuild Build(const std::string& path) { return reader_.BuildCatalog(wxString::FromUTF8(path.c_str())); }
+    CatalogBuild Build(const std::string& path) { return reader_.BuildCatalog(path); }
 
-    const _HisiAdapter_t& Adapter() const { return *reader_.m_volume->adapter; }
-    std::string ErrorText() const { return reader_.m_errorText; }
+    const _HisiAdapter_t& Adapter() const { return *reader_.Adapter(); }
+    std::string ErrorText() const { return reader_.ErrorText(); }
 
     std::string dir_;
-    CatalogReader reader_;
+    TestReader reader_;
     std::unique_ptr<dvrimage::DiskImage> image_;
 
 private:

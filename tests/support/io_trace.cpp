@@ -73,33 +73,61 @@ extern "C" int close(int fd)
     return real(fd);
 }
 
+namespace {
+
+// Notes a read of `count` bytes at `offset` of a traced file; false when it
+// is to fail. Reads of files the trace did not see opened pass untouched.
+bool NoteRead(int fd, std::int64_t offset, std::size_t count)
+{
+    State& s = TheState();
+    std::lock_guard<std::mutex> lock(s.mutex);
+    auto it = s.pathOfFd.find(fd);
+    if (it == s.pathOfFd.end())
+        return true;
+    const std::string& path = it->second;
+    ++s.readCounts[path];
+    if (s.keepReads)
+        s.reads[path].push_back({offset, count});
+    for (const Fault& f : s.failures) {
+        if (f.path == path && offset < f.offset + f.length && f.offset < offset + static_cast<std::int64_t>(count)) {
+            errno = EIO;
+            return false;
+        }
+    }
+    return true;
+}
+
+}  // namespace
+
 extern "C" ssize_t read(int fd, void* buffer, size_t count)
 {
     static auto real = Real<ssize_t (*)(int, void*, size_t)>("read");
-    State& s = TheState();
-    std::string path;
+    bool traced = false;
     {
+        State& s = TheState();
         std::lock_guard<std::mutex> lock(s.mutex);
-        auto it = s.pathOfFd.find(fd);
-        if (it == s.pathOfFd.end())
-            return real(fd, buffer, count);
-        path = it->second;
+        traced = s.pathOfFd.count(fd) != 0;
     }
-    const std::int64_t offset = lseek64(fd, 0, SEEK_CUR);
-    {
-        std::lock_guard<std::mutex> lock(s.mutex);
-        ++s.readCounts[path];
-        if (s.keepReads)
-            s.reads[path].push_back({offset, count});
-        for (const Fault& f : s.failures) {
-            if (f.path == path && offset < f.offset + f.length && f.offset < offset + static_cast<std::int64_t>(count)) {
-                errno = EIO;
-                return -1;
-            }
-        }
-    }
+    if (traced && !NoteRead(fd, lseek64(fd, 0, SEEK_CUR), count))
+        return -1;
     return real(fd, buffer, count);
 }
+
+extern "C" ssize_t pread64(int fd, void* buffer, size_t count, off64_t offset)
+{
+    static auto real = Real<ssize_t (*)(int, void*, size_t, off64_t)>("pread64");
+    if (!NoteRead(fd, offset, count))
+        return -1;
+    return real(fd, buffer, count, offset);
+}
+
+#if !defined(_FILE_OFFSET_BITS) || _FILE_OFFSET_BITS != 64
+// Where files have 64-bit offsets, pread is pread64 already.
+extern "C" ssize_t pread(int fd, void* buffer, size_t count, off_t offset)
+{
+    return pread64(fd, buffer, count, offset);
+}
+#endif
 
 namespace iotrace {
 

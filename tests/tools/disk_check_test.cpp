@@ -124,7 +124,7 @@ TEST_F(DiskCheckTest, VerificationReportsTheLyingHeader)
     const std::string path = WriteLyingDisk();
     std::vector<std::string> lines;
     const dvrfstool::VerifyResult result = dvrfstool::VerifyDisk(
-        reader_, wxString::FromUTF8(path.c_str()), [&lines](const std::string& line) { lines.push_back(line); });
+        reader_, path, [&lines](const std::string& line) { lines.push_back(line); });
     EXPECT_EQ(result.stage, dvrfstool::VerifyStage::kComplete);
     EXPECT_EQ(lines, (std::vector<std::string>{"damaged: data block 1 header (frame count 2147483647)"}));
     EXPECT_EQ(result.damaged, 1);

@@ -9,14 +9,18 @@ clip=$3
 work=$(mktemp -d)
 trap 'rm -rf "$work"' EXIT
 # With MORVANE_KEEP_DISKS naming a folder, a copy of each disk written here
-# stays there, numbered in the order written, for the golden answers.
+# stays there under its own name (name-2.img, ... when a name is written
+# again), for the golden answers.
 if [ -n "${MORVANE_KEEP_DISKS:-}" ]; then
   cat >"$work/mkdvrfs-kept" <<KEEP
 #!/usr/bin/env bash
 "$mkdvrfs" "\$@"; status=\$?
 out=\${*: -1}
 if [ \$status -eq 0 ] && [ -f "\$out" ]; then
-  cp --sparse=always "\$out" "$MORVANE_KEEP_DISKS/cli-\$(ls "$MORVANE_KEEP_DISKS" | grep -c '^cli-')-\$(basename "\$out")"
+  name=\$(basename "\$out" .img)
+  kept="$MORVANE_KEEP_DISKS/cli-\$name.img"
+  for k in \$(seq 2 99); do [ -e "\$kept" ] || break; kept="$MORVANE_KEEP_DISKS/cli-\$name-\$k.img"; done
+  cp --sparse=always "\$out" "\$kept"
 fi
 exit \$status
 KEEP
@@ -215,7 +219,7 @@ check "options before the disk" "$("$dvrfs" list "$work/one.img" --json)" "$("$d
 head -c 65536 /dev/urandom > "$work/random.img"
 : > "$work/empty.img"
 cp --sparse=always "$work/one.img" "$work/cut.img" && truncate -s 600000 "$work/cut.img"
-for case in "missing.img:cannot open: No such file or directory" ":cannot read: Is a directory (reader's code 33" \
+for case in "missing.img:cannot open: No such file or directory" ":cannot read: Is a directory" \
     "empty.img:not a recorder disk (the image is empty)" \
     "random.img:not a recorder disk: no superblock at the start (reader's code 33: FUNCTION[9" \
     "cut.img:the image is 600 KB but the disk it holds is"; do
@@ -223,6 +227,44 @@ for case in "missing.img:cannot open: No such file or directory" ":cannot read: 
   check "list of ${case%%:*} exits 1" 1 $?
   case "$err" in *"${case#*:}"*) ;; *) check "list of ${case%%:*} says: ${case#*:}" "${case#*:}" "$err" ;; esac
 done
+check "a folder is no disk, and no register was asked" "dvrfs: $work/: cannot read: Is a directory" \
+  "$("$dvrfs" list "$work/" 2>&1)"
+for case in "primary-table:backup-super:primary block table and backup superblock" \
+    "primary-super:backup-table:primary superblock and backup block table"; do
+  IFS=: read -r first second words <<<"$case"
+  "$mkdvrfs" --recording 0:0:0:100:200 --damage "$first" --damage "$second" "$work/mixed.img" >/dev/null
+  err=$("$dvrfs" list "$work/mixed.img" 2>&1)
+  case "$err" in *"not a recorder disk ($words damaged)"*) ;; *) check "$first and $second in their own words" "$words" "$err" ;; esac
+done
+
+# A recorder that recorded nothing: its newest position is still negative,
+# and the span it names holds no entry, so nothing is damaged.
+"$mkdvrfs" --list-span 0:-1 "$work/unrecorded.img" >/dev/null
+check "list of a recorder that recorded nothing" "" "$("$dvrfs" list "$work/unrecorded.img" 2>&1)"
+check "its JSON: no span, no recording, nothing skipped" \
+  '{"span_count": 0, "recordings": [], "skipped": [], "error": {"code": 50, "text": "FUNCTION[1463]"}}' \
+  "$("$dvrfs" list --json "$work/unrecorded.img")"
+out=$("$dvrfs" verify "$work/unrecorded.img")
+check "verify of it exits 0" 0 $?
+check "verify of it finds no damage" "summary: 252 records checked, 0 damaged, 0 repaired" "$out"
+
+# A name that is not UTF-8, as copied from an older system: every command
+# opens it, and prints it with the byte escaped.
+odd=$work/$'odd\xffname.img'
+"$mkdvrfs" --h264 "$clip" --recording 0:0:1:1700000000:1700000002:25 "$work/even.img" >/dev/null
+cp --sparse=always "$work/even.img" "$odd"
+check "list of a name that is not UTF-8" "$("$dvrfs" list "$work/even.img")" "$("$dvrfs" list "$odd")"
+check "info of it" "$("$dvrfs" info "$work/even.img")" "$("$dvrfs" info "$odd")"
+check "verify of it" "$("$dvrfs" verify "$work/even.img")" "$("$dvrfs" verify "$odd")"
+mkdir "$work/odd-out"
+"$dvrfs" export "$odd" 0 -o "$work/odd-out" >/dev/null
+check "export of it" 0 $?
+"$dvrfs" report "$odd" -o "$work/odd-out" >/dev/null
+check "report of it" 0 $?
+grep -qF '"disk": "'"$work"'/odd\\xffname.img"' "$work/odd-out/report.json"
+check "the report names it escaped" 0 $?
+check "a failure names it escaped" "dvrfs: $work/gone\xff.img: cannot open: No such file or directory" \
+  "$("$dvrfs" list "$work/"$'gone\xff.img' 2>&1)"
 
 # --- export: the sample clip's frames, 25 a second, a key frame a second
 "$mkdvrfs" --h264 "$clip" --recording 0:0:1:1700000000:1700000002:25 \

@@ -113,21 +113,19 @@ void BM_Decode1080Channels(benchmark::State& state)
 void BM_ReadAndDecodeToRgb(benchmark::State& state)
 {
     CatalogReader reader;
-    if (reader.BuildCatalog(wxString::FromUTF8(TheDisk().path.c_str())) != CatalogBuild::kBuilt) {
+    if (reader.BuildCatalog(TheDisk().path) != CatalogBuild::kBuilt) {
         state.SkipWithError("the disk did not open");
         return;
     }
-    const _HisiAdapter_t& adapter = *reader.m_volume->adapter;
+    const _HisiAdapter_t& adapter = *reader.Adapter();
     std::vector<unsigned char> payload(static_cast<std::size_t>(kPayloadAreaSize));
     const int frames = kBlocks * kFramesPerBlock;
     for (auto _ : state) {
         H264Decoder decoder;
-        reader.m_streamBlock = 0;
-        reader.m_streamFrame = 0;
+        reader.SetStreamCursor(0, 0);
         for (int i = 0; i < frames; ++i) {
             _HisiHeader_t header{};
-            const int size = reader.get_stream(reader.m_diskFile, payload.data(), &header, adapter.FirstList,
-                                               adapter.LastList, 1);
+            const int size = reader.NextFrame(payload.data(), &header, adapter.FirstList, adapter.LastList, 1);
             if (size < 0) {
                 state.SkipWithError("a frame did not read");
                 break;

@@ -86,12 +86,12 @@ Disks& TheDisks()
 
 void BM_CatalogBuild(benchmark::State& state)
 {
-    const wxString path = wxString::FromUTF8(TheDisks().catalogPath.c_str());
+    const std::string path = TheDisks().catalogPath;
     for (auto _ : state) {
         CatalogReader reader;
         if (reader.BuildCatalog(path) != CatalogBuild::kBuilt || reader.m_recordCount != kRecordings)
             state.SkipWithError("the catalogue build failed");
-        benchmark::DoNotOptimize(reader.m_catalog->Entries[kRecordings - 1].Idx);
+        benchmark::DoNotOptimize(reader.Catalog()->Entries[kRecordings - 1].Idx);
     }
     state.SetItemsProcessed(state.iterations() * kRecordings);
 }
@@ -114,7 +114,7 @@ void BM_CatalogFloor(benchmark::State& state)
 void BM_Extract(benchmark::State& state)
 {
     CatalogReader reader;
-    if (reader.BuildCatalog(wxString::FromUTF8(TheDisks().extractPath.c_str())) != CatalogBuild::kBuilt) {
+    if (reader.BuildCatalog(TheDisks().extractPath) != CatalogBuild::kBuilt) {
         state.SkipWithError("the catalogue build failed");
         return;
     }

@@ -82,14 +82,14 @@ void BM_CatalogueBuild(benchmark::State& state)
 {
     MorvanePlugConfig& panel = g_bench->panel();
     for (auto _ : state)
-        if (panel.BuildCatalog(DiskPathForDrive(0)) != CatalogBuild::kBuilt)
+        if (panel.BuildCatalog(std::string(DiskPathForDrive(0).fn_str())) != CatalogBuild::kBuilt)
             state.SkipWithError("the build failed");
 }
 
 void BM_ListRefill(benchmark::State& state)
 {
     MorvanePlugConfig& panel = g_bench->panel();
-    panel.BuildCatalog(DiskPathForDrive(0));
+    panel.BuildCatalog(std::string(DiskPathForDrive(0).fn_str()));
     for (auto _ : state) {
         panel.Setwxlist();
         panel.m_recordList->Update();

@@ -7,6 +7,7 @@
 
 #include "catalog/build_summary.h"
 #include "tools/dvrfs/export.h"
+#include "tools/dvrfs/json_text.h"
 
 namespace dvrfscli {
 
@@ -106,17 +107,17 @@ int CheckOutput(const std::string& disk, const std::string& output, bool force)
 
 int BuildCatalog(CatalogReader& reader, const std::string& disk)
 {
-    const CatalogBuild result = reader.BuildCatalog(wxString::FromUTF8(disk.c_str()));
-    return result == CatalogBuild::kBuilt ? kOk : SayWhyNot(result, reader, disk);
+    const CatalogBuild result = reader.BuildCatalog(disk);
+    return result == CatalogBuild::kBuilt ? kOk : SayWhyNot(reader.Status(), disk);
 }
 
-int SayWhyNot(CatalogBuild stage, const CatalogReader& reader, const std::string& disk)
+int SayWhyNot(const dvrfs::VolumeStatus& status, const std::string& disk)
 {
     std::fflush(stdout);
-    std::fprintf(stderr, "dvrfs: %s: %s", disk.c_str(), DescribeBuild(stage, reader, disk).c_str());
-    if (reader.m_errorCode != kErrNone || reader.m_errorText[0] != '\0')
-        std::fprintf(stderr, " (reader's code %d%s%s)", reader.m_errorCode, reader.m_errorText[0] ? ": " : "",
-                     reader.m_errorText);
+    std::fprintf(stderr, "dvrfs: %s: %s", PrintableName(disk).c_str(), dvrfs::DescribeFailure(status).c_str());
+    if (status.code != kErrNone || !status.registerText.empty())
+        std::fprintf(stderr, " (reader's code %d%s%s)", status.code, status.registerText.empty() ? "" : ": ",
+                     status.registerText.c_str());
     std::fputc('\n', stderr);
     return kDiskUnreadable;
 }

@@ -77,8 +77,8 @@ int CheckOutput(const std::string& disk, const std::string& output, bool force);
 int BuildCatalog(CatalogReader& reader, const std::string& disk);
 
 // Says on standard error, in plain words and then with the reader's code,
-// why a build that got as far as `stage` cannot go on; kDiskUnreadable.
-int SayWhyNot(CatalogBuild stage, const CatalogReader& reader, const std::string& disk);
+// why an open that stopped as `status` says cannot go on; kDiskUnreadable.
+int SayWhyNot(const dvrfs::VolumeStatus& status, const std::string& disk);
 
 // The evidence commands: export, hash, recover.
 int ExportCommand(const CommandLine& line);

@@ -28,11 +28,13 @@ struct VerifyResult {
     long long checked = 0;   // records read and checked
     long long damaged = 0;   // records that failed their checks
     long long repaired = 0;  // list entries whose ring copy failed and whose mirror copy holds
+    long long unwritten = 0;  // list entries of the span never written: not damage
+    dvrfs::VolumeStatus status;  // how far the open got
 };
 
 // Reads every structure of the disk once and reports each damaged or
 // repaired record as one line ("damaged: ...", "repaired: ...").
-VerifyResult VerifyDisk(CatalogReader& reader, const wxString& path,
+VerifyResult VerifyDisk(CatalogReader& reader, const std::string& path,
                         const std::function<void(const std::string&)>& report);
 
 // A stretch of a recording that extraction left out: frames whose index

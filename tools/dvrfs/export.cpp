@@ -147,12 +147,12 @@ std::string EncodePng(const AVFrame* frame, int width)
 // damaged frames included, one header read per block.
 long long CountFrames(CatalogReader& reader, const _HisiList_t& recording)
 {
-    const std::int64_t ringSize = reader.m_volume->adapter->DataBlockMax;
+    const std::int64_t ringSize = reader.Adapter()->DataBlockMax;
     const auto [start, last] = RecordingBlockSpan(recording, ringSize);
     long long frames = 0;
     for (std::int64_t n = start; n <= last; ++n) {
         _HisiBlockHeader_t header{};
-        if (reader.BlockOpe(reader.m_diskFile, 65, &header, dvrfs::ReduceInRing(n, ringSize), 1) > 0)
+        if (reader.ReadBlockHeaders(dvrfs::ReduceInRing(n, ringSize), 1, reinterpret_cast<char*>(&header)) > 0)
             frames += std::clamp(header.FrameCount, 0, 262142);
     }
     return frames;
@@ -450,7 +450,7 @@ std::vector<ExportOutcome> ExportRecordings(CatalogReader& reader, const std::ve
     std::vector<ExportOutcome> outcomes(recordings.size());
     if (recordings.empty())
         return outcomes;
-    if (!reader.m_volume || !reader.m_volume->adapter || reader.m_volume->adapter->DataBlockMax <= 0) {
+    if (!reader.Adapter() || reader.Adapter()->DataBlockMax <= 0) {
         for (ExportOutcome& outcome : outcomes)
             outcome.error = "the disk has no data ring";
         return outcomes;

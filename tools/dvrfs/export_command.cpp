@@ -83,7 +83,7 @@ bool ChooseRows(const CommandLine& line, const CatalogReader& reader, const dvrf
     if (!request.from)
         return true;
     for (int row = 0; row < reader.m_recordCount; ++row) {
-        const CatalogEntry& entry = reader.m_catalog->Entries[row];
+        const CatalogEntry& entry = reader.Catalog()->Entries[row];
         if (static_cast<std::uint32_t>(entry.EndTime) >= *request.from &&
             static_cast<std::uint32_t>(entry.StartTime) < *request.to)
             rows->push_back(row);
@@ -334,7 +334,7 @@ int ExportCommand(const CommandLine& line)
             files.push_back({row});
     int status = kOk;
     for (const std::vector<int>& file : files) {
-        const std::uint32_t start = static_cast<std::uint32_t>(reader.m_catalog->Entries[file.front()].StartTime);
+        const std::uint32_t start = static_cast<std::uint32_t>(reader.Catalog()->Entries[file.front()].StartTime);
         const std::string output =
             intoFolder ? target + (target.back() == '/' ? "" : "/") + FileName(file, start, request.format) : target;
         const int result = ExportRows(reader, disk, file, output, line.Has("--force"), request);

@@ -24,7 +24,7 @@ struct FrameSpan {
 class Extraction {
 public:
     Extraction(CatalogReader& reader, const std::function<bool(const ExtractedFrame&)>& sink)
-        : reader_(reader), adapter_(*reader.m_volume->adapter), sink_(sink),
+        : reader_(reader), adapter_(*reader.Adapter()), sink_(sink),
           payload_(static_cast<std::size_t>(kPayloadAreaSize))
     {
     }
@@ -33,7 +33,7 @@ public:
     bool Block(std::int64_t block)
     {
         _HisiBlockHeader_t header{};
-        if (reader_.BlockOpe(reader_.m_diskFile, 65, &header, block, 1) < 0) {
+        if (reader_.ReadBlockHeaders(block, 1, reinterpret_cast<char*>(&header)) < 0) {
             ++result_.skippedBlocks;
             LeaveOut(place_, 0, block);
             return true;
@@ -58,8 +58,7 @@ private:
         const std::int64_t position =
             dvrfs::RecordPosition(adapter_.DataBlockOffset, block + 1, kDataBlockBytes,
                                   -static_cast<std::int64_t>(count) * kIndexEntrySize);
-        if (reader_.BlockRead(reader_.m_diskFile, position, reinterpret_cast<char*>(index_.data()),
-                              count * kIndexEntrySize) < 0) {
+        if (reader_.ReadLogical(position, reinterpret_cast<char*>(index_.data()), count * kIndexEntrySize) < 0) {
             LeaveOut(place_, count, -1);
             return frames;
         }
@@ -107,8 +106,8 @@ private:
                 ++last;
             const std::int64_t start = frames[first].offset;
             const std::int64_t bytes = frames[last].offset + frames[last].size - start;
-            const bool read = bytes == 0 || reader_.DataBlockOpe(reader_.m_diskFile, 'a', payload_.data(), block,
-                                                                 static_cast<int>(start), static_cast<int>(bytes)) > 0;
+            const bool read = bytes == 0 || reader_.ReadPayload(block, static_cast<int>(start), static_cast<int>(bytes),
+                                                                reinterpret_cast<char*>(payload_.data())) > 0;
             for (std::size_t i = first; i <= last; ++i) {
                 const FrameSpan& frame = frames[i];
                 if (!read) {
@@ -157,8 +156,8 @@ bool RecordingOfRow(CatalogReader& reader, int row, _HisiList_t* recording)
 {
     if (row < 0 || row >= reader.m_recordCount || static_cast<std::size_t>(row) >= reader.m_rowPositions.size())
         return false;
-    return reader.BlockOpe(reader.m_diskFile, 33, recording, reader.m_rowPositions[static_cast<std::size_t>(row)],
-                           1) > 0;
+    return reader.ReadListEntries(reader.m_rowPositions[static_cast<std::size_t>(row)], 1,
+                                  reinterpret_cast<char*>(recording)) > 0;
 }
 
 std::pair<std::int64_t, std::int64_t> RecordingBlockSpan(const _HisiList_t& recording, std::int64_t ringSize)
@@ -174,9 +173,9 @@ ExtractResult ExtractRecording(CatalogReader& reader, const _HisiList_t& recordi
                                const std::function<bool(const ExtractedFrame&)>& sink,
                                const std::function<void(double)>& progress)
 {
-    if (!reader.m_volume || !reader.m_volume->adapter || reader.m_volume->adapter->DataBlockMax <= 0)
+    if (!reader.Adapter() || reader.Adapter()->DataBlockMax <= 0)
         return ExtractResult{};
-    const std::int64_t ringSize = reader.m_volume->adapter->DataBlockMax;
+    const std::int64_t ringSize = reader.Adapter()->DataBlockMax;
     const auto [start, last] = RecordingBlockSpan(recording, ringSize);
     Extraction extraction(reader, sink);
     for (std::int64_t n = start; n <= last; ++n) {

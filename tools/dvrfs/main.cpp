@@ -161,8 +161,9 @@ const char* PlainWords(std::int32_t code)
 int CannotRead(const char* disk, const char* what, const DvrDiskReader& reader)
 {
     std::fflush(stdout);
-    std::fprintf(stderr, "dvrfs: %s: %s: %s (code %d%s%s)\n", disk, what, PlainWords(reader.m_errorCode),
-                 reader.m_errorCode, reader.m_errorText[0] ? ": " : "", reader.m_errorText);
+    std::fprintf(stderr, "dvrfs: %s: %s: %s (code %d%s%s)\n", PrintableName(disk).c_str(), what,
+                 PlainWords(reader.ErrorCode()), reader.ErrorCode(), reader.ErrorText()[0] ? ": " : "",
+                 reader.ErrorText());
     return kDiskUnreadable;
 }
 
@@ -183,9 +184,10 @@ void PrintFacts(const std::vector<Fact>& facts, bool json);
 int Info(const char* disk, bool dump, bool json)
 {
     CatalogReader reader;
-    if (reader.OpenDVRFS(wxString::FromUTF8(disk)) <= 0)
-        return SayWhyNot(CatalogBuild::kNotOpened, reader, disk);
-    const _H264SuperBlock_t& super = reader.m_volume->superBlock;
+    const dvrfs::VolumeStatus status = reader.OpenVolume(disk);
+    if (!reader.Volume())
+        return SayWhyNot(status, disk);
+    const _H264SuperBlock_t& super = reader.Volume()->superBlock;
     char magic[16];
     std::snprintf(magic, sizeof magic, "0x%04X", super.Magic);
     std::vector<Fact> facts = {
@@ -197,24 +199,19 @@ int Info(const char* disk, bool dump, bool json)
         Numeric("offset_block_space", static_cast<unsigned long long>(super.OffsetBlockSpace)),
         Numeric("super_offset", static_cast<unsigned long long>(super.SuperOffset)),
         Numeric("super_offset_backup", static_cast<unsigned long long>(super.SuperOffsetBackup)),
-        {"image", reader.m_imageSource ? reader.m_imageSource->Kind() : "raw", true},
+        {"image", status.sourceKind, true},
     };
-    if (reader.m_imageSource)
-        for (const auto& [key, value] : reader.m_imageSource->Facts())
-            facts.push_back({"image_" + key, value, true});
-    const bool onBackup = reader.m_volume->copyInUse != SuperBlockCopy::kPrimary;
+    for (const auto& [key, value] : reader.Source()->Facts())
+        facts.push_back({"image_" + key, value, true});
+    const bool onBackup = reader.Volume()->copyInUse != SuperBlockCopy::kPrimary;
     facts.push_back({"superblock_copy", onBackup ? "backup" : "primary", true});
 
-    CatalogBuild stage = CatalogBuild::kBuilt;
-    if (reader.Checkconfig() <= 0)
-        stage = CatalogBuild::kNotConfigured;
-    else if (reader.BlockOpe(reader.m_diskFile, 2, nullptr, 0, 0) < 0 && !reader.m_volume->adapter)
-        stage = CatalogBuild::kNoAdapter;
-    if (stage != CatalogBuild::kBuilt) {
+    // The superblock and the adapter as far as the open found them.
+    if (!reader.Adapter()) {
         PrintFacts(facts, json);
-        return SayWhyNot(stage, reader, disk);
+        return SayWhyNot(status, disk);
     }
-    const _HisiAdapter_t& adapter = *reader.m_volume->adapter;
+    const _HisiAdapter_t& adapter = *reader.Adapter();
     for (const Fact& fact : {Numeric("adapter_slot", adapter.Idx), Numeric("adapter_version", adapter.Version),
                              Numeric("list_max", adapter.ListMax), Numeric("data_block_max", adapter.DataBlockMax),
                              Numeric("first_list", adapter.FirstList.Idx), Numeric("last_list", adapter.LastList.Idx),
@@ -230,7 +227,7 @@ int Info(const char* disk, bool dump, bool json)
     }
     PrintFacts(facts, json);
     if (dump && !json)
-        reader.BlockOpe(reader.m_diskFile, 5, nullptr, 0, 0);
+        reader.DumpAdapter();
     return kOk;
 }
 
@@ -250,16 +247,32 @@ void PrintFacts(const std::vector<Fact>& facts, bool json)
     std::fflush(stdout);
 }
 
-// Says on standard error which entries of the disk's list have no row.
+// Says on standard error which entries of the disk's list have no row, and
+// which recording could not be read to its end.
 void ReportSkipped(const CatalogReader& reader)
 {
-    const std::vector<std::int32_t>& skipped = reader.m_skippedPositions;
-    if (skipped.empty())
-        return;
-    const std::string positions = PositionsText(skipped);
     std::fflush(stdout);
-    std::fprintf(stderr, "dvrfs: %zu damaged recording entr%s skipped (list position%s %s)\n", skipped.size(),
-                 skipped.size() == 1 ? "y" : "ies", skipped.size() == 1 ? "" : "s", positions.c_str());
+    auto say = [](const std::vector<std::int32_t>& positions, const char* what) {
+        if (positions.empty())
+            return;
+        std::fprintf(stderr, "dvrfs: %zu %s recording entr%s skipped (list position%s %s)\n", positions.size(), what,
+                     positions.size() == 1 ? "y" : "ies", positions.size() == 1 ? "" : "s",
+                     PositionsText(positions).c_str());
+    };
+    say(reader.m_skippedPositions, "damaged");
+    say(reader.m_unwrittenPositions, "unwritten");
+    if (reader.m_newestBlockUnreadableRow >= 0)
+        std::fprintf(stderr, "dvrfs: the newest recording's newest block is unreadable (row %d)\n",
+                     reader.m_newestBlockUnreadableRow);
+    if (reader.Status().Truncated())
+        std::fprintf(stderr, "dvrfs: %s\n", dvrfs::TruncationText(reader.Status()).c_str());
+}
+
+void PrintPositions(const char* key, const std::vector<std::int32_t>& positions)
+{
+    std::printf("], \"%s\": [", key);
+    for (std::size_t i = 0; i < positions.size(); ++i)
+        std::printf("%s%d", i ? ", " : "", positions[i]);
 }
 
 int List(const char* disk, bool json)
@@ -268,12 +281,12 @@ int List(const char* disk, bool json)
     if (const int status = BuildCatalog(reader, disk); status != kOk)
         return status;
     ReportSkipped(reader);
-    const RecordCatalog& catalog = *reader.m_catalog;
+    const RecordCatalog& catalog = *reader.Catalog();
     if (!json) {
         for (int row = 0; row < reader.m_recordCount; ++row) {
             const CatalogEntry& e = catalog.Entries[row];
-            const std::uint32_t start = static_cast<std::uint32_t>(e.StartTime);
-            const std::uint32_t end = static_cast<std::uint32_t>(e.EndTime);
+            const std::uint32_t start = e.StartSeconds();
+            const std::uint32_t end = e.EndSeconds();
             std::string when = std::string(e.DateText) + " " + e.TimeText;
             if (TextZone() == Zone::kLocal)
                 when = TimeText(start, "%Y/%m/%d %H:%M:%S-", Zone::kLocal) + TimeText(end, "%H:%M:%S", Zone::kLocal);
@@ -284,21 +297,24 @@ int List(const char* disk, bool json)
     std::printf("{\"span_count\": %u, \"recordings\": [", catalog.SpanCount);
     for (int row = 0; row < reader.m_recordCount; ++row) {
         const CatalogEntry& e = catalog.Entries[row];
-        const std::uint32_t start = static_cast<std::uint32_t>(e.StartTime);
-        const std::uint32_t end = static_cast<std::uint32_t>(e.EndTime);
+        const std::uint32_t start = e.StartSeconds();
+        const std::uint32_t end = e.EndSeconds();
         std::printf("%s{\"row\": %d, \"idx\": %d, \"start\": %u, \"end\": %u, \"date\": %s, \"time\": %s, "
                     "\"start_utc\": \"%s\", \"end_utc\": \"%s\"}",
                     row ? ", " : "", row, e.Idx, start, end, JsonText(e.DateText).c_str(),
                     JsonText(e.TimeText).c_str(), dvrfstool::IsoUtc(start).c_str(), dvrfstool::IsoUtc(end).c_str());
     }
-    std::printf("], \"skipped\": [");
-    for (std::size_t i = 0; i < reader.m_skippedPositions.size(); ++i)
-        std::printf("%s%d", i ? ", " : "", reader.m_skippedPositions[i]);
-    if (reader.m_errorCode == kErrNone && reader.m_errorText[0] == '\0')
-        std::printf("], \"error\": null}\n");
+    PrintPositions("skipped", reader.m_skippedPositions);
+    if (!reader.m_unwrittenPositions.empty())
+        PrintPositions("unwritten", reader.m_unwrittenPositions);
+    std::printf("]");
+    if (reader.m_newestBlockUnreadableRow >= 0)
+        std::printf(", \"newest_block_unreadable_row\": %d", reader.m_newestBlockUnreadableRow);
+    if (!reader.HasError())
+        std::printf(", \"error\": null}\n");
     else
-        std::printf("], \"error\": {\"code\": %d, \"text\": %s}}\n", reader.m_errorCode,
-                    JsonText(reader.m_errorText).c_str());
+        std::printf(", \"error\": {\"code\": %d, \"text\": %s}}\n", reader.ErrorCode(),
+                    JsonText(reader.ErrorText()).c_str());
     return kOk;
 }
 
@@ -307,7 +323,7 @@ int Verify(const char* disk, bool json)
     CatalogReader reader;
     std::vector<std::string> findings;
     const dvrfstool::VerifyResult result =
-        dvrfstool::VerifyDisk(reader, wxString::FromUTF8(disk), [json, &findings](const std::string& line) {
+        dvrfstool::VerifyDisk(reader, disk, [json, &findings](const std::string& line) {
             if (json)
                 findings.push_back(line);
             else
@@ -315,8 +331,11 @@ int Verify(const char* disk, bool json)
         });
     static const char* const kStages[] = {"not opened", "not configured", "no adapter", "complete"};
     if (json) {
-        std::printf("{\"stage\": \"%s\", \"checked\": %lld, \"damaged\": %lld, \"repaired\": %lld, \"findings\": [",
+        std::printf("{\"stage\": \"%s\", \"checked\": %lld, \"damaged\": %lld, \"repaired\": %lld, ",
                     kStages[static_cast<int>(result.stage)], result.checked, result.damaged, result.repaired);
+        if (result.unwritten > 0)
+            std::printf("\"unwritten\": %lld, ", result.unwritten);
+        std::printf("\"findings\": [");
         for (std::size_t i = 0; i < findings.size(); ++i) {
             const std::size_t colon = findings[i].find(": ");
             std::printf("%s{\"kind\": %s, \"record\": %s}", i ? ", " : "",
@@ -325,15 +344,12 @@ int Verify(const char* disk, bool json)
         }
         std::printf("]}\n");
     } else {
-        std::printf("summary: %lld records checked, %lld damaged, %lld repaired\n", result.checked, result.damaged,
-                    result.repaired);
+        std::printf("summary: %lld records checked, %lld damaged, %lld repaired%s\n", result.checked, result.damaged,
+                    result.repaired,
+                    result.unwritten > 0 ? (", " + std::to_string(result.unwritten) + " unwritten").c_str() : "");
     }
-    switch (result.stage) {
-    case dvrfstool::VerifyStage::kNotOpened: return SayWhyNot(CatalogBuild::kNotOpened, reader, disk);
-    case dvrfstool::VerifyStage::kNotConfigured: return SayWhyNot(CatalogBuild::kNotConfigured, reader, disk);
-    case dvrfstool::VerifyStage::kNoAdapter: return SayWhyNot(CatalogBuild::kNoAdapter, reader, disk);
-    case dvrfstool::VerifyStage::kComplete: break;
-    }
+    if (result.stage != dvrfstool::VerifyStage::kComplete)
+        return SayWhyNot(result.status, disk);
     return result.damaged + result.repaired > 0 ? kDamageFound : kOk;
 }
 

@@ -19,7 +19,7 @@ std::vector<std::int32_t> RowOfEachBlock(CatalogReader& reader, std::int64_t rin
 {
     for (std::int32_t position : reader.m_rowPositions) {
         _HisiList_t entry{};
-        if (reader.BlockOpe(reader.m_diskFile, 33, &entry, position, 1) < 0)
+        if (reader.ReadListEntries(position, 1, reinterpret_cast<char*>(&entry)) < 0)
             entry = _HisiList_t{};
         entries->push_back(entry);
     }
@@ -60,9 +60,9 @@ std::vector<std::int32_t> RowOfEachBlock(CatalogReader& reader, std::int64_t rin
 RecoverResult FindUnlistedRuns(CatalogReader& reader)
 {
     RecoverResult result;
-    if (!reader.m_volume || !reader.m_volume->adapter || reader.m_volume->adapter->DataBlockMax <= 0)
+    if (!reader.Adapter() || reader.Adapter()->DataBlockMax <= 0)
         return result;
-    const _HisiAdapter_t& adapter = *reader.m_volume->adapter;
+    const _HisiAdapter_t& adapter = *reader.Adapter();
     const std::int64_t ringSize = adapter.DataBlockMax;
     std::vector<_HisiList_t> entries;
     const std::vector<std::int32_t> owner = RowOfEachBlock(reader, ringSize, &entries);
@@ -91,7 +91,7 @@ RecoverResult FindUnlistedRuns(CatalogReader& reader)
         }
         _HisiBlockHeader_t header{};
         ++result.headersRead;
-        const bool sound = reader.BlockOpe(reader.m_diskFile, 65, &header, block, 1) > 0 && header.BlockIdx == block;
+        const bool sound = reader.ReadBlockHeaders(block, 1, reinterpret_cast<char*>(&header)) > 0 && header.BlockIdx == block;
         if (!sound) {
             closeRun();
             continue;

@@ -36,7 +36,7 @@ struct ReportRow {
 std::string Html(const std::string& text)
 {
     std::string out;
-    for (const char c : text) {
+    for (const char c : PrintableName(text)) {
         switch (c) {
         case '<': out += "&lt;"; break;
         case '>': out += "&gt;"; break;
@@ -110,7 +110,7 @@ Findings Verify(const std::string& disk)
 {
     Findings findings;
     CatalogReader reader;
-    findings.result = VerifyDisk(reader, wxString::FromUTF8(disk.c_str()), [&findings](const std::string& line) {
+    findings.result = VerifyDisk(reader, disk, [&findings](const std::string& line) {
         findings.lines.push_back(line);
         long long entry = 0;
         if (std::sscanf(line.c_str(), "repaired: list entry %lld", &entry) == 1)
@@ -202,17 +202,16 @@ void WriteHtml(const std::string& path, const ReportRequest& request, const std:
 std::string WriteReport(const ReportRequest& request)
 {
     CatalogReader reader;
-    const CatalogBuild result = reader.BuildCatalog(wxString::FromUTF8(request.disk.c_str()));
-    const std::string summary = DescribeBuild(result, reader, request.disk);
+    const CatalogBuild result = reader.BuildCatalog(request.disk);
+    const std::string summary = DescribeBuild(reader);
     if (result != CatalogBuild::kBuilt)
         return summary;
     std::vector<ReportRow> rows;
     const Findings findings = Verify(request.disk);
     for (int row = 0; row < reader.m_recordCount; ++row) {
-        const CatalogEntry& entry = reader.m_catalog->Entries[row];
+        const CatalogEntry& entry = reader.Catalog()->Entries[row];
         const std::int32_t position = reader.m_rowPositions[static_cast<std::size_t>(row)];
-        ReportRow r{row, entry.Idx, position, static_cast<std::uint32_t>(entry.StartTime),
-                    static_cast<std::uint32_t>(entry.EndTime), findings.repairedEntries.count(position) != 0, {}, {}};
+        ReportRow r{row, entry.Idx, position, entry.StartSeconds(), entry.EndSeconds(), findings.repairedEntries.count(position) != 0, {}, {}};
         _HisiList_t recording{};
         if (RecordingOfRow(reader, row, &recording))
             r.keyFrame = FirstKeyFrame(reader, recording);

@@ -1,12 +1,9 @@
 // The verification walk: every structure of the disk read once, each record
 // checked by its XOR sum (and its bounds), each finding reported on a line.
 #include <algorithm>
-#include <cstdio>
+#include <climits>
 #include <vector>
 
-#include <wx/log.h>
-
-#include "dvrfs/image_source.h"
 #include "tools/dvrfs/disk_check.h"
 
 namespace dvrfstool {
@@ -22,24 +19,25 @@ public:
     {
     }
 
-    VerifyResult Run(const wxString& path)
+    VerifyResult Run(const std::string& path)
     {
-        reader_.m_errorCode = kErrNone;
-        reader_.m_errorText[0] = '\0';
-        if (reader_.OpenDVRFS(path) <= 0) {
-            // Neither copy opens: say what is wrong with each, if the device reads.
-            if (OpenWithoutVerifying(path))
-                CheckSuperBlockCopies();
-            reader_.CloseDVRFS();
+        reader_.ClearError();
+        const dvrfs::VolumeStatus status = reader_.OpenVolume(path);
+        result_.status = status;
+        if (status.stage == dvrfs::OpenStage::kSource)
             return result_;
-        }
-        CheckSuperBlockCopies();
+        // Both copies as the open found them; the one it did not need is read now.
+        reader_.InspectSuperBlockCopies();
+        CheckSuperBlockCopy("primary", reader_.Status().primary);
+        CheckSuperBlockCopy("backup", reader_.Status().backup);
+        if (status.stage == dvrfs::OpenStage::kSuperBlock)
+            return result_;
         CheckAdapterSlots();
-        if (reader_.Checkconfig() <= 0) {
+        if (status.stage == dvrfs::OpenStage::kConfiguration) {
             result_.stage = VerifyStage::kNotConfigured;
             return result_;
         }
-        if (reader_.BlockOpe(reader_.m_diskFile, 2, nullptr, 0, 0) < 0 && !reader_.m_volume->adapter) {
+        if (!reader_.Adapter()) {
             result_.stage = VerifyStage::kNoAdapter;
             return result_;
         }
@@ -50,8 +48,7 @@ public:
     }
 
 private:
-    const _HisiAdapter_t& Adapter() const { return *reader_.m_volume->adapter; }
-    wxFile* File() const { return reader_.m_diskFile; }
+    const _HisiAdapter_t& Adapter() const { return *reader_.Adapter(); }
 
     void Damaged(const std::string& what)
     {
@@ -75,57 +72,22 @@ private:
     {
         if (position > static_cast<std::uint64_t>(INT64_MAX) || size > INT_MAX)
             return false;
-        return reader_.BlockRead(File(), static_cast<wxInt64>(position), static_cast<char*>(buffer),
-                                 static_cast<int>(size)) > 0;
+        return reader_.ReadLogical(static_cast<wxInt64>(position), static_cast<char*>(buffer),
+                                   static_cast<int>(size)) > 0;
     }
 
-    // The device or image, opened as the volume open does (in place of what
-    // the failed open left), with an empty volume for the superblock loads
-    // to fill.
-    bool OpenWithoutVerifying(const wxString& path)
-    {
-        reader_.CloseDVRFS();
-        reader_.m_diskFile = new wxFile;
-        reader_.m_volume = new DvrVolume;
-        wxLogNull quiet;
-        if (!reader_.m_diskFile->Open(path, wxFile::read))
-            return false;
-        std::string sourceError;
-        reader_.m_imageSource = dvrfs::OpenImageSource(path.utf8_string(), &sourceError);
-        return reader_.m_imageSource || sourceError.empty();
-    }
-
-    // Both copies of the superblock and block table, each checked as the
-    // volume open checks it; the copy in use and the register stay as the
-    // open left them. The backup is found from the primary copy, as the open
-    // finds it.
-    void CheckSuperBlockCopies()
-    {
-        DvrVolume& volume = *reader_.m_volume;
-        const _H264SuperBlock_t inUse = volume.superBlock;
-        const std::vector<_H264BlockTable_t> table = volume.blockTable;
-        const std::int32_t code = reader_.m_errorCode;
-        const std::string text = reader_.m_errorText;
-        CheckSuperBlockCopy("primary", 3);
-        CheckSuperBlockCopy("backup", 5);
-        volume.superBlock = inUse;
-        volume.blockTable = table;
-        reader_.m_errorCode = code;
-        std::snprintf(reader_.m_errorText, sizeof reader_.m_errorText, "%s", text.c_str());
-    }
-
-    void CheckSuperBlockCopy(const std::string& copy, char mode)
+    // One copy of the superblock and its block table, as the open checks it:
+    // the table is checked only under a sound superblock.
+    void CheckSuperBlockCopy(const std::string& copy, dvrfs::CopyState state)
     {
         ++result_.checked;
-        if (reader_.SuperBlockOpe(File(), mode, nullptr) >= 0 && reader_.CheckSuperBlockValues() >= 0) {
-            ++result_.checked;  // and its block table
-            return;
-        }
-        if (reader_.m_errorCode == kErrBlockTable || reader_.m_errorCode == kErrTableSize) {
+        switch (state) {
+        case dvrfs::CopyState::kSound: ++result_.checked; break;
+        case dvrfs::CopyState::kTableDamaged:
             ++result_.checked;
             Damaged(copy + " block table");
-        } else {
-            Damaged(copy + " superblock");
+            break;
+        default: Damaged(copy + " superblock"); break;
         }
     }
 
@@ -133,7 +95,7 @@ private:
     // with another number is simply not in use.
     void CheckAdapterSlots()
     {
-        const std::int64_t stride = reader_.m_volume->superBlock.BlockSize;
+        const std::int64_t stride = reader_.Volume()->superBlock.BlockSize;
         for (int slot = 0; slot < kAdapterSlotCount; ++slot) {
             _HisiAdapter_t adapter{};
             if (!ReadAt(static_cast<std::uint64_t>(slot * stride), &adapter, kAdapterSize)) {
@@ -152,13 +114,16 @@ private:
     std::pair<std::int64_t, std::int64_t> SpanOnDisk()
     {
         _HisiAdapter_t slot{};
-        const std::uint64_t position = static_cast<std::uint64_t>(Adapter().Idx) * reader_.m_volume->superBlock.BlockSize;
+        const std::uint64_t position = static_cast<std::uint64_t>(Adapter().Idx) * reader_.Volume()->superBlock.BlockSize;
         if (Adapter().Idx >= 0 && ReadAt(position, &slot, kAdapterSize) && slot.Idx == Adapter().Idx)
             return {slot.FirstList.Idx, slot.LastList.Idx};
         return {Adapter().FirstList.Idx, Adapter().LastList.Idx};
     }
 
     // Each list position of the span once, in the list ring and in the mirror.
+    // An entry whose two copies hold only zero bytes was never written; a
+    // recorder whose newest position is negative and whose span holds no
+    // readable entry has recorded nothing, so nothing of its list is damage.
     void CheckListSpan(std::pair<std::int64_t, std::int64_t> span)
     {
         const std::int64_t ringSize = Adapter().ListMax;
@@ -170,27 +135,67 @@ private:
             return;
         const std::int64_t from = std::max<std::int64_t>(first, 0);
         const std::int64_t to = std::min(last, from + ringSize - 1);
+        if (span.second < 0 && !AnyEntryReadable(from, to, ringSize)) {
+            result_.checked += 2 * (to - from + 1);
+            return;
+        }
         for (std::int64_t p = from; p <= to; ++p) {
             const std::int64_t position = p % ringSize;
-            _HisiList_t ring{};
-            _HisiList_t mirror{};
-            const bool ringSound =
-                ReadAt(Adapter().ListOffset + position * kListEntrySize, &ring, kListEntrySize) &&
-                SumMatches(&ring, kListEntrySize);
-            const bool mirrorSound =
-                ReadAt(Adapter().ListOffsetBackup + position * kListEntrySize, &mirror, kListEntrySize) &&
-                SumMatches(&mirror, kListEntrySize);
+            const ListCopies copies = ReadListCopies(position);
             result_.checked += 2;
             const std::string name = "list entry " + std::to_string(position);
-            if (!ringSound && !mirrorSound)
+            if (!copies.ringSound && !copies.mirrorSound && copies.blank) {
+                ++result_.unwritten;
+                report_("unwritten: " + name + " (never written)");
+            } else if (!copies.ringSound && !copies.mirrorSound) {
                 Damaged(name + " (ring and mirror copies)");
-            else if (!ringSound)
+            } else if (!copies.ringSound) {
                 Repaired(name + " (ring copy damaged, mirror copy used)");
-            else if (!mirrorSound)
+            } else if (!copies.mirrorSound) {
                 Damaged(name + " (mirror copy)");
-            if (ringSound || mirrorSound)
-                AddRecordingBlocks(ringSound ? ring : mirror);
+            }
+            if (copies.ringSound || copies.mirrorSound)
+                AddRecordingBlocks(copies.ringSound ? copies.ring : copies.mirror);
         }
+    }
+
+    // Whether any entry of positions from .. to reads in either copy; it
+    // stops at the first that does, so a recorder's list costs one entry.
+    bool AnyEntryReadable(std::int64_t from, std::int64_t to, std::int64_t ringSize)
+    {
+        for (std::int64_t p = from; p <= to; ++p) {
+            const ListCopies copies = ReadListCopies(p % ringSize);
+            if (copies.ringSound || copies.mirrorSound)
+                return true;
+        }
+        return false;
+    }
+
+    struct ListCopies {
+        _HisiList_t ring{};
+        _HisiList_t mirror{};
+        bool ringSound = false;
+        bool mirrorSound = false;
+        bool blank = true;  // both copies read whole and hold only zero bytes
+    };
+
+    ListCopies ReadListCopies(std::int64_t position)
+    {
+        ListCopies copies;
+        const bool ringRead = ReadAt(Adapter().ListOffset + position * kListEntrySize, &copies.ring, kListEntrySize);
+        copies.blank = ringRead && reader_.LastReadWhole() && Blank(copies.ring);
+        copies.ringSound = ringRead && SumMatches(&copies.ring, kListEntrySize);
+        const bool mirrorRead =
+            ReadAt(Adapter().ListOffsetBackup + position * kListEntrySize, &copies.mirror, kListEntrySize);
+        copies.blank = copies.blank && mirrorRead && reader_.LastReadWhole() && Blank(copies.mirror);
+        copies.mirrorSound = mirrorRead && SumMatches(&copies.mirror, kListEntrySize);
+        return copies;
+    }
+
+    static bool Blank(const _HisiList_t& entry)
+    {
+        const auto* bytes = reinterpret_cast<const unsigned char*>(&entry);
+        return std::all_of(bytes, bytes + sizeof entry, [](unsigned char b) { return b == 0; });
     }
 
     // The data blocks a recording claims, as runs of block numbers inside the
@@ -231,7 +236,7 @@ private:
         const std::string name = "data block " + std::to_string(block);
         _HisiBlockHeader_t header{};
         ++result_.checked;
-        if (reader_.BlockOpe(File(), 65, &header, block, 1) < 0) {
+        if (reader_.ReadBlockHeaders(block, 1, reinterpret_cast<char*>(&header)) < 0) {
             Damaged(name + " header");
             return;
         }
@@ -273,7 +278,7 @@ private:
 
 }  // namespace
 
-VerifyResult VerifyDisk(CatalogReader& reader, const wxString& path,
+VerifyResult VerifyDisk(CatalogReader& reader, const std::string& path,
                         const std::function<void(const std::string&)>& report)
 {
     return Verifier(reader, report).Run(path);
