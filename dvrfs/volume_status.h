@@ -69,8 +69,12 @@ struct VolumeStatus {
     std::int32_t listRingSize = 0;
 
     bool Ready() const { return stage == OpenStage::kReady; }
-    // The image is a file shorter than the disk its superblock describes.
-    bool Truncated() const { return !device && claimedSize > 0 && sourceSize < claimedSize; }
+    // The image (or a device of known size) is shorter than the disk its
+    // superblock describes.
+    bool Truncated() const
+    {
+        return claimedSize > 0 && sourceSize < claimedSize && (sourceSize > 0 || !device);
+    }
 };
 
 // Why an open that did not reach kReady stopped, in plain words for the

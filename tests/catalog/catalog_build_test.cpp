@@ -1,5 +1,6 @@
 // The catalogue build: the list ring walked from the oldest to the newest
 // recording into at most 8192 entries with their UTC texts.
+#include <cerrno>
 #include <numeric>
 #include <string>
 #include <vector>
@@ -192,6 +193,13 @@ TEST_F(CatalogBuildTest, BuildIsDescribedInPlainWords)
          "2 recordings, 2023-11-14 22:13 to 2023-11-15 01:01 (local time); 1 damaged entry skipped; "
          "primary superblock damaged, backup used"},
         {{{Target::PrimaryBlockTable}, {Target::BackupBlockTable}}, "not a recorder disk (both block tables damaged)"},
+        {{{Target::PrimaryBlockTable}, {Target::BackupSuperBlock}},
+         "not a recorder disk (primary block table and backup superblock damaged)"},
+        {{{Target::PrimarySuperBlock}, {Target::BackupBlockTable}},
+         "not a recorder disk (primary superblock and backup block table damaged)"},
+        {{{Target::BlockHeader, 2}},
+         "3 recordings, 2023-11-14 22:13 to 2023-11-15 01:01 (local time); "
+         "the newest recording's newest block is unreadable"},
         {all, "no recording entry can be read (3 entries damaged)"},
     };
     int n = 0;
@@ -204,6 +212,55 @@ TEST_F(CatalogBuildTest, BuildIsDescribedInPlainWords)
         Build(path);
         EXPECT_EQ(DescribeBuild(reader_), c.summary);
     }
+}
+
+// Failures no image writer makes, said from the open's status alone.
+TEST(DescribeFailureTest, EachStageInItsOwnWords)
+{
+    using dvrfs::OpenStage;
+    using dvrfs::VolumeStatus;
+    auto status = [](OpenStage stage, void (*change)(VolumeStatus&)) {
+        VolumeStatus s;
+        s.stage = stage;
+        s.sourceSize = 600000;
+        s.listRingSize = 16;
+        change(s);
+        return s;
+    };
+    const struct {
+        const char* name;
+        VolumeStatus status;
+        std::string words;
+    } cases[] = {
+        {"NoPermission", status(OpenStage::kSource, [](VolumeStatus& s) { s.systemError = EACCES; }),
+         "cannot open: Permission denied \u2014 reading a raw disk needs membership of the disk group"},
+        {"ImageOfAKnownKind", status(OpenStage::kSource, [](VolumeStatus& s) { s.detail = "the first piece cannot be read"; }),
+         "cannot open the image: the first piece cannot be read"},
+        {"Folder", status(OpenStage::kSource, [](VolumeStatus& s) { s.systemError = EISDIR; }),
+         "cannot read: Is a directory"},
+        {"EmptyImage", status(OpenStage::kSuperBlock, [](VolumeStatus& s) { s.sourceSize = 0; }),
+         "not a recorder disk (the image is empty)"},
+        {"ImpossibleLayout",
+         status(OpenStage::kSuperBlock, [](VolumeStatus& s) { s.backup = dvrfs::CopyState::kImpossibleLayout; }),
+         "not a recorder disk (its superblock describes an impossible layout)"},
+        {"RingsTooLarge", status(OpenStage::kAdapter, [](VolumeStatus& s) { s.code = kErrAdapterRings; }),
+         "the recorder's rings are larger than this reader accepts (list ring above 1,048,576 entries or data "
+         "ring above 4,194,304 blocks)"},
+        {"NoAdapterOfATruncatedImage", status(OpenStage::kAdapter, [](VolumeStatus& s) { s.claimedSize = 136000000; }),
+         "no valid state record of the recorder found; the image is 600 KB but the disk it holds is 136 MB: "
+         "truncated?"},
+        {"EmptyListRing", status(OpenStage::kRefresh, [](VolumeStatus& s) { s.listRingSize = 0; }),
+         "no recording entry can be read (the list ring holds no entry)"},
+        {"DamagedAndBlankEntries",
+         status(OpenStage::kRefresh, [](VolumeStatus& s) { s.damagedEntries = 1, s.unwrittenEntries = 2; }),
+         "no recording entry can be read (1 entry damaged, 2 entries never written)"},
+        {"DeviceOfUnknownSize",
+         status(OpenStage::kConfiguration, [](VolumeStatus& s) { s.device = true, s.sourceSize = 0, s.claimedSize = 9; }),
+         "no recorder was ever configured on this disk"},
+        {"Ready", status(OpenStage::kReady, [](VolumeStatus&) {}), ""},
+    };
+    for (const auto& c : cases)
+        EXPECT_EQ(dvrfs::DescribeFailure(c.status), c.words) << c.name;
 }
 
 }  // namespace

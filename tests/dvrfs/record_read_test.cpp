@@ -11,6 +11,7 @@
 namespace {
 
 using dvrimage::GeneratedRecording;
+using dvrimage::Target;
 
 // Recordings at list positions 0, 1, 2 and 15 (the last of the ring of 16);
 // the last one fills data block 7, the last of the ring of 8.
@@ -118,6 +119,95 @@ TEST_F(RecordReadTest, OperationsNeedAnAdapterAndIgnoreUnknownCodes)
     EXPECT_EQ(reader_.BlockOpe(nullptr, 35, nullptr, 0, 1), -1);
     EXPECT_EQ(reader_.BlockOpe(nullptr, 'x', buffer, 0, 1), 1);
     EXPECT_EQ(reader_.DataBlockOpe(nullptr, 'x', buffer, 0, 0, 1), 1);
+}
+
+// Each operation code forwards to its named operation: on two readers of
+// the same disk, the two give the same result, the same bytes, the same
+// register and the same stream cursor.
+TEST_F(RecordReadTest, EachOperationCodeDoesWhatItsNamedOperationDoes)
+{
+    image_->Damage(Target::ListEntry, 1);
+    image_->Damage(Target::BlockHeader, 3);
+    Refingerprint(path_);
+    using Op = std::function<int(TestReader&, char*)>;
+    _HisiList_t first{};  // the oldest and the newest recording, as the stream walk needs them
+    first.EndBlock = 1;
+    _HisiList_t last{};
+    last.Idx = 15;
+    last.StartBlock = 6;
+    last.EndBlock = 7;
+    auto header = [](char* b) { return reinterpret_cast<_HisiHeader_t*>(b); };
+    auto payload = [](char* b) { return reinterpret_cast<unsigned char*>(b + 64); };
+    const struct {
+        const char* name;
+        Op code;
+        Op named;
+    } cases[] = {
+        {"load primary", [](TestReader& r, char*) { return r.SuperBlockOpe(nullptr, 3, nullptr); },
+         [](TestReader& r, char*) { return r.LoadPrimarySuperBlock(); }},
+        {"load backup", [](TestReader& r, char*) { return r.SuperBlockOpe(nullptr, 5, nullptr); },
+         [](TestReader& r, char*) { return r.LoadBackupSuperBlock(); }},
+        {"verify superblock", [](TestReader& r, char*) { return r.SuperBlockOpe(nullptr, 6, nullptr); },
+         [](TestReader& r, char*) { return r.VerifySuperBlock(); }},
+        {"verify table", [](TestReader& r, char*) { return r.SuperBlockOpe(nullptr, 7, nullptr); },
+         [](TestReader& r, char*) { return r.VerifyBlockTable(); }},
+        {"configured version", [](TestReader& r, char*) { return r.Checkconfig(); },
+         [](TestReader& r, char*) { return r.ConfiguredVersion(); }},
+        {"sectors", [](TestReader& r, char* b) { return r.HddataRead(nullptr, b, 700, 900); },
+         [](TestReader& r, char* b) { return r.ReadSectors(b, 700, 900); }},
+        {"logical", [](TestReader& r, char* b) { return r.BlockRead(nullptr, 4090, b, 900); },
+         [](TestReader& r, char* b) { return r.ReadLogical(4090, b, 900); }},
+        {"block offset", [](TestReader& r, char* b) { return r.BlockShift(1000, reinterpret_cast<wxInt64*>(b)); },
+         [](TestReader& r, char* b) { return r.PhysicalBlockOffset(1000, reinterpret_cast<wxInt64*>(b)); }},
+        {"adapter search", [](TestReader& r, char*) { return r.BlockOpe(nullptr, 2, nullptr, 0, 0); },
+         [](TestReader& r, char*) { return r.FindAdapter(); }},
+        {"refresh", [](TestReader& r, char*) { return r.BlockOpe(nullptr, 35, nullptr, 0, 3); },
+         [](TestReader& r, char*) { return r.RefreshAdapter(0, 3); }},
+        {"list entries repaired", [](TestReader& r, char* b) { return r.BlockOpe(nullptr, 33, b, 0, 3); },
+         [](TestReader& r, char* b) { return r.ReadListEntries(0, 3, b); }},
+        {"list entry unwritten", [](TestReader& r, char* b) { return r.BlockOpe(nullptr, 33, b, 3, 1); },
+         [](TestReader& r, char* b) { return r.ReadListEntries(3, 1, b); }},
+        {"headers", [](TestReader& r, char* b) { return r.BlockOpe(nullptr, 65, b, 0, 3); },
+         [](TestReader& r, char* b) { return r.ReadBlockHeaders(0, 3, b); }},
+        {"damaged header", [](TestReader& r, char* b) { return r.BlockOpe(nullptr, 65, b, 3, 1); },
+         [](TestReader& r, char* b) { return r.ReadBlockHeaders(3, 1, b); }},
+        {"index entries", [](TestReader& r, char* b) { return r.DataBlockOpe(nullptr, 'Q', b, 4, 0, 3); },
+         [](TestReader& r, char* b) { return r.ReadIndexEntries(4, 0, 3, b); }},
+        {"payload", [](TestReader& r, char* b) { return r.DataBlockOpe(nullptr, 'a', b, 4, 500, 1500); },
+         [](TestReader& r, char* b) { return r.ReadPayload(4, 500, 1500, b); }},
+        {"next frame forward",
+         [&](TestReader& r, char* b) { return r.get_stream(nullptr, payload(b), header(b), first, last, 1); },
+         [&](TestReader& r, char* b) { return r.NextFrame(payload(b), header(b), first, last, 1); }},
+        {"next frame backward",
+         [&](TestReader& r, char* b) { return r.get_stream(nullptr, payload(b), header(b), first, last, 0); },
+         [&](TestReader& r, char* b) { return r.NextFrame(payload(b), header(b), first, last, 0); }},
+        {"frame run",
+         [&](TestReader& r, char* b) { return r.StreamRead(nullptr, 3, 4, 0, 3, header(b), payload(b)); },
+         [&](TestReader& r, char* b) { return r.ReadFrameRun(3, 4, 0, 3, header(b), payload(b)); }},
+        {"open", [&](TestReader& r, char*) { return r.OpenDVRFS(wxString(path_)); },
+         [&](TestReader& r, char*) { return r.OpenDisk(path_); }},
+    };
+    for (const auto& c : cases) {
+        TestReader byCode;
+        TestReader byName;
+        std::vector<char> codeBytes(8192, 0x5A);
+        std::vector<char> nameBytes(8192, 0x5A);
+        for (TestReader* r : {&byCode, &byName}) {
+            ASSERT_TRUE(r->OpenVolume(path_).Ready());
+            r->ClearError();
+            r->SetStreamCursor(4, 2);
+        }
+        EXPECT_EQ(c.code(byCode, codeBytes.data()), c.named(byName, nameBytes.data())) << c.name;
+        EXPECT_EQ(codeBytes, nameBytes) << c.name;
+        EXPECT_EQ(byCode.ErrorCode(), byName.ErrorCode()) << c.name;
+        EXPECT_STREQ(byCode.ErrorText(), byName.ErrorText()) << c.name;
+        EXPECT_EQ(byCode.StreamBlock(), byName.StreamBlock()) << c.name;
+        EXPECT_EQ(byCode.StreamFrame(), byName.StreamFrame()) << c.name;
+        ASSERT_EQ(byCode.Adapter() == nullptr, byName.Adapter() == nullptr) << c.name;
+        if (byCode.Adapter()) {
+            EXPECT_EQ(std::memcmp(byCode.Adapter(), byName.Adapter(), sizeof(_HisiAdapter_t)), 0) << c.name;
+        }
+    }
 }
 
 }  // namespace

@@ -263,6 +263,23 @@ check "export of it" 0 $?
 check "report of it" 0 $?
 grep -qF '"disk": "'"$work"'/odd\\xffname.img"' "$work/odd-out/report.json"
 check "the report names it escaped" 0 $?
+# A real block device: a disk image attached read-only as a loop device reads
+# as the image does, and the device's size is its own (a cut one is named).
+if [ "$(id -u)" -eq 0 ] && dev=$(losetup -r -f --show "$work/even.img" 2>/dev/null); then
+  check "list of the device is the list of the image" "$("$dvrfs" list "$work/even.img")" "$("$dvrfs" list "$dev")"
+  check "verify of the device is the verify of the image" "$("$dvrfs" verify "$work/even.img")" \
+    "$("$dvrfs" verify "$dev")"
+  check "info names the device" "image=raw device" "$("$dvrfs" info "$dev" | grep '^image=')"
+  losetup -d "$dev"
+  if dev=$(losetup -r -f --show "$work/cut.img" 2>/dev/null); then
+    err=$("$dvrfs" list "$dev" 2>&1)
+    case "$err" in *"the image is 600 KB but the disk it holds is 136 MB: truncated?"*) ;;
+      *) check "a cut device is named" "truncated?" "$err" ;; esac
+    losetup -d "$dev"
+  fi
+else
+  echo "no loop device here: the block device checks are left out"
+fi
 check "a failure names it escaped" "dvrfs: $work/gone\xff.img: cannot open: No such file or directory" \
   "$("$dvrfs" list "$work/"$'gone\xff.img' 2>&1)"
 
