@@ -67,8 +67,14 @@ RecoverResult FindUnlistedRuns(CatalogReader& reader)
     std::vector<_HisiList_t> entries;
     const std::vector<std::int32_t> owner = RowOfEachBlock(reader, ringSize, &entries);
 
-    const std::int64_t head = adapter.LastList.Idx >= 0 ? dvrfs::ReduceInRing(adapter.LastList.EndBlock + 1, ringSize)
-                                                        : 0;
+    // The scan starts after the newest recording's end. That end is a number
+    // from a list entry whose block may not have been readable: any int.
+    std::int64_t head = 0;
+    if (adapter.LastList.Idx >= 0) {
+        head = (static_cast<std::int64_t>(adapter.LastList.EndBlock) + 1) % ringSize;
+        if (head < 0)
+            head += ringSize;
+    }
     std::optional<std::uint32_t> lastEnd;  // of the listed recording met last
     UnlistedRun run;
     bool inRun = false;
