@@ -84,8 +84,7 @@ bool ChooseRows(const CommandLine& line, const CatalogReader& reader, const dvrf
         return true;
     for (int row = 0; row < reader.m_recordCount; ++row) {
         const CatalogEntry& entry = reader.Catalog()->Entries[row];
-        if (static_cast<std::uint32_t>(entry.EndTime) >= *request.from &&
-            static_cast<std::uint32_t>(entry.StartTime) < *request.to)
+        if (entry.EndSeconds() >= *request.from && entry.StartSeconds() < *request.to)
             rows->push_back(row);
     }
     return true;
@@ -334,7 +333,7 @@ int ExportCommand(const CommandLine& line)
             files.push_back({row});
     int status = kOk;
     for (const std::vector<int>& file : files) {
-        const std::uint32_t start = static_cast<std::uint32_t>(reader.Catalog()->Entries[file.front()].StartTime);
+        const std::uint32_t start = reader.Catalog()->Entries[file.front()].StartSeconds();
         const std::string output =
             intoFolder ? target + (target.back() == '/' ? "" : "/") + FileName(file, start, request.format) : target;
         const int result = ExportRows(reader, disk, file, output, line.Has("--force"), request);
