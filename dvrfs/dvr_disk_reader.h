@@ -39,7 +39,7 @@ enum DvrErrorCode : std::int32_t {
     kErrListEntry = 50,        // list entry fails its XOR sum in the list ring
     kErrBlockHeader = 52,      // data block header fails its XOR sum
     kErrIndexEntry = 53,       // index entry fails its XOR sum
-    kErrNoFrame = 54,          // a whole turn of the data ring held no frame
+    kErrNoFrame = 54,          // a whole turn of the data ring, or 4096 blocks, held no frame
     kErrListNegative = 65,
     kErrListBeyond = 66,
     kErrBlockNegative = 69,

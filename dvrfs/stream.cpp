@@ -14,9 +14,15 @@ namespace {
 
 // A walk that passes over this many blocks without finding a frame has gone
 // round the ring at least once with nothing to deliver: it would never end.
+// However large the ring, one call passes at most kMaxEmptyBlocksInACall
+// (64 GiB of data blocks without a frame, which no recorder writes): a disk
+// of unwritten blocks that pass their sum, or a span of one empty block
+// walked round and round, costs that many reads, not twice the ring's.
+constexpr wxInt64 kMaxEmptyBlocksInACall = 4096;
+
 wxInt64 MaxEmptyBlocks(wxInt64 ringSize)
 {
-    return 2 * std::max<wxInt64>(ringSize, 0) + 2;
+    return std::min(2 * std::max<wxInt64>(ringSize, 0) + 2, kMaxEmptyBlocksInACall);
 }
 
 }  // namespace

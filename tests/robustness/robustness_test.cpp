@@ -109,6 +109,32 @@ TEST_F(RobustnessTest, NewestRecordingWithoutAnyHeaderIsSearchedOnceRoundTheRing
                 reads);
 }
 
+// The newest recording is one sound block without a frame in a ring of 2^20
+// blocks: each stream call goes round that block a bounded number of times,
+// not twice the ring's size, before it says the walk found no frame.
+TEST_F(RobustnessTest, EmptyBlockInAHugeRingCostsABoundedWalk)
+{
+    Layout layout = SmallLayout();
+    layout.dataBlockMax = 1 << 20;
+    layout.blockSizeShift = 20;
+    layout.imageSize = 1ull << 30;
+    layout.adapterRecordsFrame = false;
+    const std::string path = WriteDisk(layout, {GeneratedRecording(0, 5, 5, 100, 200, 1 << 20, 0, 64)});
+    ASSERT_EQ(Build(path), CatalogBuild::kBuilt);
+
+    iotrace::KeepReads(false);
+    iotrace::Reset();
+    std::vector<unsigned char> payload(64);
+    _HisiHeader_t header{};
+    const _HisiAdapter_t adapter = *reader_.Adapter();
+    for (int direction : {1, 0}) {
+        reader_.SetStreamCursor(5, direction ? 0 : -1);
+        EXPECT_EQ(reader_.NextFrame(payload.data(), &header, adapter.FirstList, adapter.LastList, direction), -1);
+        EXPECT_EQ(reader_.ErrorCode(), kErrNoFrame);
+    }
+    EXPECT_LE(iotrace::ReadCount(path), 2u * 3 * 4096 + 16);  // a header and a list entry a step, each way
+}
+
 // 2^17 recordings, each claiming the whole data ring of 2^16 blocks (none of
 // them written): verify checks each block once, and walks no recording's
 // blocks again, so it costs the list span plus the ring, not their product.
